@@ -42,8 +42,12 @@ private:
 //! A variable of the host's dataset.
 class IMCVariable {
 public:
-    //! How values are stored: numbers or texts.
-    enum VariableStorage { kNoStorage = 0, kNumericStorage = 2, kStringStorage = 3 };
+    //! How values are stored. The component reads numbers (2) and texts (3); the other codes
+    //! are the host's storage kinds that a plan file may name.
+    enum VariableStorage : int {
+        kNoStorage = 0, kIntegerStorage = 1, kNumericStorage = 2, kStringStorage = 3,
+        kDateStorage = 4, kTimeStorage = 5, kTimestampStorage = 6
+    };
     //! Measurement kinds: 1 and 4 are scale (continuous) kinds, 2 and 3 categorical kinds
     //! (nominal and ordered-categorical); 0 is unknown.
     enum MeasureKind { kUnknownKind = 0, kScaleKind = 1, kNominalKind = 2, kOrderedKind = 3,
