@@ -1,0 +1,153 @@
+#include "mcmath/mcdistfun.h"
+#include "mcmath/mcquantile.h"
+
+#include "mccommon/mcmv.h"
+#include "mctolerance.h"
+#include "reference/distfun_reference.h"
+
+#include <boost/math/distributions/beta.hpp>
+#include <boost/math/distributions/gamma.hpp>
+
+#include <gtest/gtest.h>
+
+#include <cmath>
+#include <limits>
+#include <string>
+#include <utility>
+#include <vector>
+
+using MCCommon_800::MCMV;
+using MCMath_800::MCBetaQuantile;
+using MCMath_800::MCDistFun;
+using MCMath_800::MCGammaQuantile;
+using MCMath_800::MCMathPolicy;
+using MCMath_800::MCNormalQuantile;
+
+namespace {
+
+constexpr double kNaN = std::numeric_limits<double>::quiet_NaN();
+//! The stated accuracy of the prepared quantiles against Boost's inverse.
+constexpr double kRel = 1e-12;
+
+//! Probabilities from 1e-12 to 1 − 1e-12, evenly in s = ln(p/(1 − p)) and off the table's
+//! nodes, so the interpolation, the fallback beyond |s| = 23 and both halves are all met.
+std::vector<double> Probabilities() {
+    std::vector<double> ps;
+    for (double s = -27.6; s <= 27.6; s += 0.0917) {
+        ps.push_back(1.0 / (1.0 + std::exp(-s)));
+    }
+    for (const double p : {1e-300, 0.5, std::nextafter(0.5, 1.0), std::nextafter(1.0, 0.0)}) {
+        ps.push_back(p);
+    }
+    return ps;
+}
+
+class GammaQuantileVsBoost : public ::testing::TestWithParam<double> {};
+
+TEST_P(GammaQuantileVsBoost, AgreesAcrossProbabilities) {
+    const double shape = GetParam();
+    for (const double rate : {0.25, 1.0, 7.5}) {
+        const MCGammaQuantile q(shape, rate);
+        const boost::math::gamma_distribution<double, MCMathPolicy> dist(shape, 1.0 / rate);
+        for (const double p : Probabilities()) {
+            const double expected = boost::math::quantile(dist, p);
+            if (!std::isfinite(expected)) {
+                continue;
+            }
+            EXPECT_NEAR_TOL(q(p), expected, kRel, 1e-300)
+                << "shape " << shape << " rate " << rate << " p " << p;
+        }
+    }
+}
+
+INSTANTIATE_TEST_SUITE_P(Shapes, GammaQuantileVsBoost,
+                         ::testing::Values(0.01, 0.05, 0.3, 0.9, 1.0, 2.5, 17.0, 300.0, 1e4));
+
+class BetaQuantileVsBoost : public ::testing::TestWithParam<std::pair<double, double>> {};
+
+TEST_P(BetaQuantileVsBoost, AgreesAcrossProbabilities) {
+    const auto [a, b] = GetParam();
+    const MCBetaQuantile q(a, b);
+    const boost::math::beta_distribution<double, MCMathPolicy> dist(a, b);
+    for (const double p : Probabilities()) {
+        const double expected = boost::math::quantile(dist, p);
+        // Relative to the nearer end of the support; a few ulp where 1 − x is that small.
+        const double tol =
+            kRel * std::fmin(expected, 1.0 - expected) + 4.0 * mctest::kEps * expected;
+        EXPECT_NEAR_TOL(q(p), expected, 0.0, tol) << "a " << a << " b " << b << " p " << p;
+    }
+}
+
+INSTANTIATE_TEST_SUITE_P(Shapes, BetaQuantileVsBoost,
+                         ::testing::Values(std::make_pair(0.05, 0.05), std::make_pair(0.1, 3.0),
+                                           std::make_pair(0.5, 0.7), std::make_pair(2.0, 5.0),
+                                           std::make_pair(3.0, 0.2), std::make_pair(50.0, 80.0),
+                                           std::make_pair(1e3, 1e4), std::make_pair(0.01, 100.0),
+                                           std::make_pair(1.0, 3.0), std::make_pair(0.5, 0.5)),
+                         [](const ::testing::TestParamInfo<std::pair<double, double>>& paramInfo) {
+                             return "case" + std::to_string(paramInfo.index);
+                         });
+
+TEST(PreparedQuantiles, AgreeWithHighPrecisionReferences) {
+    int checked = 0;
+    for (const auto& row : mcreference::kDistFunRows) {
+        const std::string f = row.fFunction;
+        if (f == "IdfGam") {
+            EXPECT_NEAR_REL(MCGammaQuantile(row.fB, row.fC)(row.fA), row.fExpected, kRel)
+                << "gamma " << row.fB << " p " << row.fA;
+            ++checked;
+        } else if (f == "IdfBeta") {
+            EXPECT_NEAR_REL(MCBetaQuantile(row.fB, row.fC)(row.fA), row.fExpected, kRel)
+                << "beta " << row.fB << ", " << row.fC << " p " << row.fA;
+            ++checked;
+        } else if (f == "IdfNorm") {
+            EXPECT_NEAR_REL(MCNormalQuantile(row.fB, row.fC)(row.fA), row.fExpected, kRel);
+            ++checked;
+        }
+    }
+    EXPECT_GT(checked, 50);
+}
+
+TEST(PreparedQuantiles, InvertTheDistributionFunction) {
+    const MCGammaQuantile gamma(0.4, 2.0);
+    const MCBetaQuantile beta(0.7, 2.5);
+    for (double x = 0.01; x < 1.0; x += 0.0173) {
+        EXPECT_NEAR_REL(gamma(MCDistFun::CdfGam(x, 0.4, 2.0)), x, 1e-11) << x;
+        EXPECT_NEAR_REL(beta(MCDistFun::CdfBeta(x, 0.7, 2.5)), x, 1e-11) << x;
+    }
+}
+
+TEST(PreparedQuantiles, EdgesAndInvalidParameters) {
+    const MCGammaQuantile gamma(2.0, 3.0);
+    const MCBetaQuantile beta(2.0, 3.0);
+    const MCNormalQuantile normal(1.0, 2.0);
+    EXPECT_EQ(gamma(0.0), 0.0);
+    EXPECT_TRUE(MCMV::IsMissing(gamma(1.0)));
+    EXPECT_EQ(beta(0.0), 0.0);
+    EXPECT_EQ(beta(1.0), 1.0);
+    EXPECT_TRUE(MCMV::IsMissing(normal(0.0)));
+    EXPECT_TRUE(MCMV::IsMissing(normal(1.0)));
+    EXPECT_EQ(normal(0.5), 1.0);
+    for (const double bad : {kNaN, -0.25, 1.5}) {
+        EXPECT_TRUE(MCMV::IsMissing(gamma(bad)));
+        EXPECT_TRUE(MCMV::IsMissing(beta(bad)));
+        EXPECT_TRUE(MCMV::IsMissing(normal(bad)));
+    }
+    // Invalid parameters (and the default objects) give missing for every p.
+    const double inf = std::numeric_limits<double>::infinity();
+    for (const auto& [first, second] : std::vector<std::pair<double, double>>{
+             {0.0, 1.0}, {-1.0, 1.0}, {1.0, 0.0}, {kNaN, 1.0}, {1.0, inf}}) {
+        EXPECT_FALSE(MCGammaQuantile(first, second).IsValid());
+        EXPECT_FALSE(MCBetaQuantile(first, second).IsValid());
+        for (const double p : {0.0, 0.3, 1.0}) {
+            EXPECT_TRUE(MCMV::IsMissing(MCGammaQuantile(first, second)(p)));
+            EXPECT_TRUE(MCMV::IsMissing(MCBetaQuantile(first, second)(p)));
+        }
+    }
+    EXPECT_FALSE(MCNormalQuantile(0.0, 0.0).IsValid());
+    EXPECT_TRUE(MCMV::IsMissing(MCGammaQuantile()(0.5)));
+    EXPECT_TRUE(MCMV::IsMissing(MCBetaQuantile()(0.5)));
+    EXPECT_TRUE(MCMV::IsMissing(MCNormalQuantile()(0.5)));
+}
+
+} // namespace
