@@ -523,19 +523,4 @@ void DFCAlgorithm::FinishSecondPass() {
     }
 }
 
-// ------------------------------------------------------------------------------------------
-// The steps after the initial estimates
-
-MCStatus DFCAlgorithm::OptimizeDistParams(MultiPassRecordIter& /*trainData*/) {
-    return MCStatus(); // The later fitting steps fill in the maximum-likelihood estimates.
-}
-
-MCStatus DFCAlgorithm::ComputeChiSquare() {
-    return MCStatus(); // The later fitting steps fill in the chi-square tests and best fits.
-}
-
-MCStatus DFCAlgorithm::PerformFitGoodness(MultiPassRecordIter& /*trainData*/) {
-    return MCStatus(); // The later fitting steps fill in the EDF tests and best fits.
-}
-
 } // namespace MCMCSP_800
