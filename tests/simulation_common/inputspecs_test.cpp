@@ -1,6 +1,5 @@
 // Simulated and fixed input fields: distributions, autofit candidates, the effective level,
 // value labels, the stepped fixed values and value semantics.
-#include "mccommon/display.h"
 #include "simulation_common/simulatespecs.h"
 
 #include "mctolerance.h"
@@ -9,7 +8,6 @@
 
 #include <cmath>
 #include <limits>
-#include <sstream>
 
 using namespace MCMCSP_800;
 using namespace MCSPConst;
@@ -20,64 +18,36 @@ DistType AsType(int t) {
     return static_cast<DistType>(t);
 }
 
-std::string DisplayText(const SimInputSpecs& input) {
-    std::ostringstream os;
-    MCDisplay_800::ScopedOutStream redirect(os);
-    input.Display();
-    return os.str();
-}
-
-} // namespace
-
+// Types outside the vocabulary are refused; unknown names give an Unknown element. With several
+// distributions there is no final one, but the first one's type is reported; the final
+// categories come from a first categorical.
 TEST(SimInputSpecs, DistributionsAreAddedForKnownTypesOnly) {
-    SimInputSpecs input(true);
-    EXPECT_EQ(input.GetFinalDistType(), kDistUnknown);
-    EXPECT_EQ(input.GetFinalDistribution(), nullptr);
-    EXPECT_EQ(input.AddDistribution(AsType(16)), -1);
-    EXPECT_EQ(input.AddDistribution(AsType(-1)), -1);
-    EXPECT_EQ(input.GetDistElementSize(), 0u);
-
-    EXPECT_EQ(input.AddDistribution("DistNormal"), 0);
-    EXPECT_EQ(input.GetDistribution(0)->GetDistType(), kDistNormal);
-    EXPECT_EQ(input.GetDistribution(0)->GetDistName(), "Normal");
-    EXPECT_EQ(input.GetFinalDistribution(), input.GetDistribution(0));
-    EXPECT_EQ(input.AddDistribution(kDistUnknown), 1);
-    EXPECT_EQ(input.GetDistribution(1)->GetDistName(), "Unknown");
-    EXPECT_EQ(input.AddDistribution("no such name"), 2);
-    EXPECT_EQ(input.GetDistribution(2)->GetDistType(), kDistUnknown);
-    EXPECT_EQ(input.GetDistribution(3), nullptr);
-
-    // Several distributions: no final one, but the first one's type is reported.
-    EXPECT_EQ(input.GetFinalDistribution(), nullptr);
-    EXPECT_EQ(input.GetFinalDistType(), kDistNormal);
-}
-
-TEST(SimInputSpecs, FinalCategoriesComeFromAFirstCategorical) {
     SimInputSpecs input(true);
     std::vector<std::string> cats{"untouched"};
     input.GetFinalCategories(cats);
     EXPECT_EQ(cats, std::vector<std::string>{"untouched"});
-    input.AddDistribution(kDistCategorical);
+    EXPECT_EQ(input.AddDistribution(AsType(16)), -1);
+    EXPECT_EQ(input.AddDistribution(AsType(-1)), -1);
+    EXPECT_EQ(input.AddDistribution("DistCategorical"), 0);
     ASSERT_TRUE(input.GetDistribution(0)->AddParameter("cats", std::vector<std::string>{"a", "b"}));
+    EXPECT_EQ(input.GetFinalDistribution(), input.GetDistribution(0));
     EXPECT_TRUE(input.IsFinalCategoricalDist());
     input.GetFinalCategories(cats);
     EXPECT_EQ(cats, (std::vector<std::string>{"a", "b"}));
+    EXPECT_EQ(input.AddDistribution("no such name"), 1);
+    EXPECT_EQ(input.GetDistribution(1)->GetDistType(), kDistUnknown);
+    EXPECT_EQ(input.GetDistribution(2), nullptr);
+    EXPECT_EQ(input.GetFinalDistribution(), nullptr);
+    EXPECT_EQ(input.GetFinalDistType(), kDistCategorical);
 }
 
-TEST(SimInputSpecsAutofit, DefaultCandidatesByLevel) {
-    SimInputSpecs continuous(false);
-    EXPECT_TRUE(continuous.SetDefaultAutofit(kLevelContinuous));
-    EXPECT_EQ(continuous.GetAutofitNames(),
-              (std::vector<std::string>{"Lognormal", "Normal", "Triangular", "Uniform", "Weibull",
-                                        "Gamma", "Beta", "Exponential"}));
-
+// The defaults follow the level; raised flags stay raised; an unknown level raises nothing.
+TEST(SimInputSpecsAutofit, DefaultCandidatesAccumulateByLevel) {
     SimInputSpecs ordinal(false);
     ordinal.SetVarLevel(kLevelOrdinal);
     EXPECT_TRUE(ordinal.SetDefaultAutofit());
     EXPECT_EQ(ordinal.GetAutofitTypes(),
               (std::vector<DistType>{kDistBinomial, kDistNegbinomial, kDistPoisson}));
-
-    // Raised flags stay raised; an unknown level raises nothing.
     EXPECT_TRUE(ordinal.SetDefaultAutofit(kLevelCategorical));
     EXPECT_EQ(ordinal.GetAutofitTypes(), (std::vector<DistType>{kDistBinomial, kDistNegbinomial,
                                                                 kDistCategorical, kDistPoisson}));
@@ -116,27 +86,17 @@ TEST(SimInputSpecsAutofit, CandidateListsMustShareOneCategory) {
 }
 
 // ---------------------------------------------------------------------------------------------
-// Effective measurement level.
-
-namespace {
+// Effective measurement level: candidates, then distributions, then the storage decide.
 
 struct LevelCase {
     const char* label;
-    bool manual;
-    bool text;
+    bool manual, text; //!< manual distribution; stores texts
     MeasureLevel own;
-    std::vector<DistType> candidates;
-    std::vector<DistType> distributions;
+    std::vector<DistType> candidates, distributions;
     MeasureLevel expected;
 };
 
-std::ostream& operator<<(std::ostream& os, const LevelCase& c) {
-    return os << c.label;
-}
-
 class EffectiveLevel : public ::testing::TestWithParam<LevelCase> {};
-
-} // namespace
 
 TEST_P(EffectiveLevel, FollowsCandidatesThenDistributionsThenStorage) {
     const LevelCase& c = GetParam();
@@ -152,48 +112,27 @@ TEST_P(EffectiveLevel, FollowsCandidatesThenDistributionsThenStorage) {
     EXPECT_EQ(SimInputSpecs::GetEffectMeasurementLevel(input), c.expected);
 }
 
-namespace {
 constexpr MeasureLevel kCont = kLevelContinuous;
 constexpr MeasureLevel kCat = kLevelCategorical;
 constexpr MeasureLevel kOrd = kLevelOrdinal;
-} // namespace
 
-// (label, manual, stores texts, own level, candidates, distributions, expected)
-INSTANTIATE_TEST_SUITE_P(
-    Rules, EffectiveLevel,
-    ::testing::Values(
-        LevelCase{"ManualTextNoDistribution", true, true, kCont, {}, {}, kCat},
-        LevelCase{"ManualNumberKeepsOwnLevel", true, false, kOrd, {}, {}, kOrd},
-        LevelCase{
-            "ManualFirstDistDecides", true, false, kCat, {}, {kDistNormal, kDistPoisson}, kCont},
-        LevelCase{
-            "ManualIgnoresCandidates", true, false, kCont, {kDistNormal}, {kDistPoisson}, kOrd},
-        LevelCase{
-            "AutofitLowestCandidate", false, false, kCont, {kDistNormal, kDistBinomial}, {}, kOrd},
-        LevelCase{"AutofitBernoulliIsNone", false, false, kCont, {kDistBernoulli}, {}, kCont},
-        LevelCase{"AutofitUsesDistribution", false, true, kCont, {}, {kDistCategorical}, kCat},
-        LevelCase{"EmpiricalHasNoCategory", false, false, kOrd, {}, {kDistEmpirical}, kOrd},
-        LevelCase{"EmpiricalTextIsCategorical", true, true, kOrd, {}, {kDistEmpirical}, kCat},
-        LevelCase{"UserRangesIsContinuous", true, true, kCat, {}, {kDistUserRanges}, kCont}),
-    [](const ::testing::TestParamInfo<LevelCase>& row) { return std::string(row.param.label); });
+// clang-format off
+const LevelCase kLevelCases[] = {
+    {"ManualTextNoDistribution", true, true, kCont, {}, {}, kCat},
+    {"ManualNumberKeepsOwnLevel", true, false, kOrd, {}, {}, kOrd},
+    {"ManualFirstDistDecides", true, false, kCat, {}, {kDistNormal, kDistPoisson}, kCont},
+    {"ManualIgnoresCandidates", true, false, kCont, {kDistNormal}, {kDistPoisson}, kOrd},
+    {"AutofitLowestCandidate", false, false, kCont, {kDistNormal, kDistBinomial}, {}, kOrd},
+    {"AutofitBernoulliIsNone", false, false, kCont, {kDistBernoulli}, {}, kCont},
+    {"AutofitUsesDistribution", false, true, kCont, {}, {kDistCategorical}, kCat},
+    {"EmpiricalHasNoCategory", false, false, kOrd, {}, {kDistEmpirical}, kOrd},
+    {"EmpiricalTextIsCategorical", true, true, kOrd, {}, {kDistEmpirical}, kCat},
+    {"UserRangesIsContinuous", true, true, kCat, {}, {kDistUserRanges}, kCont}};
+// clang-format on
+INSTANTIATE_TEST_SUITE_P(Rules, EffectiveLevel, ::testing::ValuesIn(kLevelCases),
+                         [](const auto& row) { return std::string(row.param.label); });
 
 // ---------------------------------------------------------------------------------------------
-
-TEST(SimInputSpecs, BoundsAreSetOnlyAwayFromTheExtremes) {
-    SimInputSpecs input(true);
-    EXPECT_FALSE(input.HasMinimum());
-    EXPECT_FALSE(input.HasMaximum());
-    EXPECT_EQ(input.GetMinimum(), -1.7976931348623157e308);
-    EXPECT_EQ(input.GetMaximum(), 1.7976931348623157e308);
-    input.SetMinimum(0.0);
-    EXPECT_TRUE(input.HasMinimum());
-    EXPECT_FALSE(input.HasMaximum());
-    const std::string text = DisplayText(input);
-    EXPECT_NE(text.find("The Minimum has been set and the value is: 0\n"), std::string::npos);
-    EXPECT_EQ(text.find("The Maximum has been set"), std::string::npos);
-    EXPECT_EQ(text.rfind("End of display SimInputSpecs object\n"),
-              text.size() - std::string("End of display SimInputSpecs object\n").size());
-}
 
 TEST(SimInputSpecs, ValueLabelsNeedMatchingLists) {
     SimInputSpecs input(true);
@@ -279,3 +218,5 @@ TEST(FixedInputSpecs, KindFollowsTheFirstValue) {
     EXPECT_TRUE(copy.IsNumeric());
     EXPECT_EQ(copy.GetInputValueSize(), 1u);
 }
+
+} // namespace

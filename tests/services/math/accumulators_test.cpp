@@ -7,7 +7,9 @@
 
 #include <algorithm>
 #include <cmath>
+#include <cstdint>
 #include <limits>
+#include <numeric>
 #include <random>
 #include <vector>
 
@@ -19,207 +21,143 @@ namespace {
 constexpr double kNaN = std::numeric_limits<double>::quiet_NaN();
 constexpr double kInf = std::numeric_limits<double>::infinity();
 
-// Mean and M2 by the two-pass formula in long double: the reference for the one-pass updates.
-struct TwoPass {
-    long double fW = 0.0L;
-    long double fMean = 0.0L;
-    long double fM2 = 0.0L;
-};
-
-TwoPass ReferenceMoments(const std::vector<double>& x, const std::vector<double>& w) {
-    TwoPass r;
+// Two-pass references in long double for the one-pass updates: the weighted mean, and the
+// cross product Σ w·(a - mean_a)·(b - mean_b) (M2 when a = b).
+long double Mean(const std::vector<double>& x, const std::vector<double>& w) {
+    long double sw = 0.0L, swx = 0.0L;
     for (std::size_t i = 0; i < x.size(); ++i) {
-        r.fW += w[i];
-        r.fMean += static_cast<long double>(w[i]) * x[i];
+        sw += w[i];
+        swx += static_cast<long double>(w[i]) * x[i];
     }
-    r.fMean /= r.fW;
-    for (std::size_t i = 0; i < x.size(); ++i) {
-        const long double d = x[i] - r.fMean;
-        r.fM2 += w[i] * d * d;
-    }
-    return r;
+    return swx / sw;
 }
 
-// Cross product Σ w·(a - mean_a)·(b - mean_b) by two passes in long double.
-long double ReferenceXProd(const std::vector<double>& a, const std::vector<double>& b,
-                           const std::vector<double>& w) {
-    const TwoPass ra = ReferenceMoments(a, w);
-    const TwoPass rb = ReferenceMoments(b, w);
+double XProd(const std::vector<double>& a, const std::vector<double>& b,
+             const std::vector<double>& w) {
+    const long double ma = Mean(a, w), mb = Mean(b, w);
     long double c = 0.0L;
     for (std::size_t i = 0; i < a.size(); ++i) {
-        c += w[i] * (a[i] - ra.fMean) * (b[i] - rb.fMean);
+        c += w[i] * (a[i] - ma) * (b[i] - mb);
     }
-    return c;
+    return static_cast<double>(c);
 }
 
-} // namespace
+void ExpectNearAll(const std::vector<double>& a, const std::vector<double>& b, double rel) {
+    ASSERT_EQ(a.size(), b.size());
+    for (std::size_t i = 0; i < a.size(); ++i) {
+        EXPECT_NEAR_REL(a[i], b[i], rel) << "index " << i;
+    }
+}
 
-// ------------------------------------------------------------------------------------------
-// Pooling k random parts equals one pass, and both match the two-pass reference. The two
-// results differ only in the order of rounding errors (O(n·eps) at worst for these
-// well-conditioned data), hence 1e-12 relative.
-
+// Two identities at once: pooling k random parts equals one pass, and a row of weight r·w equals
+// r rows of weight w (the one pass takes the former, the parts the latter); both match the
+// two-pass reference. The results differ only in the order of rounding errors (O(n·eps) at
+// worst for these well-conditioned data), hence 1e-12 relative.
 class PoolSplit : public ::testing::TestWithParam<int> {};
 
-TEST_P(PoolSplit, PooledPartsEqualOnePass) {
-    const int k = GetParam();
-    const auto uk = static_cast<std::size_t>(k);
-    std::mt19937_64 gen(77u + uk);
+TEST_P(PoolSplit, PooledPartsOfRepeatedRowsEqualOneWeightedPass) {
+    const auto k = static_cast<std::size_t>(GetParam());
+    std::mt19937_64 gen(77u + k);
     std::normal_distribution<double> normal(6.0, 2.0);
     std::uniform_real_distribution<double> weight(0.1, 3.0);
-    std::uniform_int_distribution<std::size_t> part(0, uk - 1);
-    // Three correlated columns for the cross products: x, x·z and 10 - x.
+    std::uniform_int_distribution<int> repeats(1, 3);
+    std::uniform_int_distribution<std::size_t> part(0, k - 1);
+    // Index k holds the one pass, 0 .. k-1 the parts.
+    std::vector<MCContStats> s(k + 1);
+    std::vector<MCCatStats> cat(k + 1);
+    std::vector<MCHistogramData> hist(k + 1, MCHistogramData(12, 0.0, 12.0, true));
+    std::vector<MCProvMeans> pm(k + 1, MCProvMeans(3, true));
     std::vector<double> x, xz, w;
-    MCContStats whole;
-    MCCatStats wholeCat;
-    MCHistogramData wholeHist(12, 0.0, 12.0, true);
-    MCProvMeans wholeMeans(3, true);
-    std::vector<MCContStats> parts(uk);
-    std::vector<MCCatStats> cats(uk);
-    std::vector<MCHistogramData> hists(uk, wholeHist);
-    std::vector<MCProvMeans> means(uk, wholeMeans);
+    std::int64_t rows = 0; // rows seen by the parts
+    const auto update = [&](std::size_t p, const std::vector<double>& row, double wi) {
+        ASSERT_TRUE(s[p].Update(row[0], wi) && pm[p].Update(row, wi));
+        ASSERT_TRUE(hist[p].UpdateData(wi, 1.0, row[0]));
+        cat[p].Update(row[0], wi);
+    };
     for (int i = 0; i < 2000; ++i) {
         x.push_back(normal(gen));
         xz.push_back(x.back() * normal(gen));
-        w.push_back(weight(gen));
+        const double w0 = weight(gen);
+        const int r = repeats(gen);
+        w.push_back(r * w0);
+        rows += r;
+        // Three correlated columns for the cross products: x, x·z and 10 - x.
         const std::vector<double> row{x.back(), xz.back(), 10.0 - x.back()};
-        const std::size_t p = part(gen);
-        ASSERT_TRUE(whole.Update(x.back(), w.back()) && parts[p].Update(x.back(), w.back()));
-        EXPECT_EQ(wholeCat.Update(x.back(), w.back()), cats[p].Update(x.back(), w.back()));
-        ASSERT_TRUE(wholeHist.UpdateData(w.back(), 1.0, x.back()));
-        ASSERT_TRUE(hists[p].UpdateData(w.back(), 1.0, x.back()));
-        ASSERT_TRUE(wholeMeans.Update(row, w.back()) && means[p].Update(row, w.back()));
+        update(k, row, w.back());
+        for (int j = 0; j < r; ++j) {
+            update(part(gen), row, w0);
+        }
     }
     MCContStats pooled;
     MCCatStats pooledCat;
     MCHistogramData pooledHist(12, 0.0, 12.0, true);
     MCProvMeans merged(3, true);
-    for (std::size_t p = 0; p < uk; ++p) {
-        pooled.Pool(parts[p]);
-        pooledCat.Pool(cats[p]);
-        ASSERT_TRUE(pooledHist.Merge(hists[p]));
-        ASSERT_TRUE(merged.Merge(means[p]));
+    for (std::size_t p = 0; p < k; ++p) {
+        pooled.Pool(s[p]);
+        pooledCat.Pool(cat[p]);
+        ASSERT_TRUE(pooledHist.Merge(hist[p]) && merged.Merge(pm[p]));
     }
 
-    const TwoPass ref = ReferenceMoments(x, w);
-    for (const MCContStats* s : {&whole, &pooled}) {
-        EXPECT_EQ(s->GetCount(), 2000);
-        EXPECT_NEAR_REL(s->GetSumFreqWeights(), static_cast<double>(ref.fW), 1e-12);
-        EXPECT_NEAR_REL(s->GetMean(), static_cast<double>(ref.fMean), 1e-12);
-        EXPECT_NEAR_REL(s->GetVariance(), static_cast<double>(ref.fM2 / (ref.fW - 1.0L)), 1e-12);
+    const auto mean = static_cast<double>(Mean(x, w));
+    const double m2 = XProd(x, x, w);
+    const double sumW = std::accumulate(w.begin(), w.end(), 0.0L);
+    EXPECT_EQ(s[k].GetCount(), 2000);
+    EXPECT_EQ(pooled.GetCount(), rows);
+    for (const MCContStats* r : {&s[k], &pooled}) {
+        EXPECT_NEAR_REL(r->GetSumFreqWeights(), sumW, 1e-12);
+        EXPECT_NEAR_REL(r->GetMean(), mean, 1e-12);
+        EXPECT_NEAR_REL(r->GetVariance(), m2 / (sumW - 1.0), 1e-12);
         double lo = 0.0;
         double hi = 0.0;
-        ASSERT_TRUE(s->GetExtrema(lo, hi));
+        ASSERT_TRUE(r->GetExtrema(lo, hi));
         EXPECT_EQ(lo, *std::min_element(x.begin(), x.end()));
         EXPECT_EQ(hi, *std::max_element(x.begin(), x.end()));
     }
-    for (const MCProvMeans* m : {&wholeMeans, &merged}) {
-        EXPECT_NEAR_REL(m->GetMeans()[0], static_cast<double>(ref.fMean), 1e-12);
-        EXPECT_NEAR_REL(m->GetXProds().GetElem(0, 0), static_cast<double>(ref.fM2), 1e-12);
-        // Column 2 is 10 - x: its cross product with x is -M2.
-        EXPECT_NEAR_REL(m->GetXProds().GetElem(2, 0), -static_cast<double>(ref.fM2), 1e-12);
-        EXPECT_NEAR_REL(m->GetXProds().GetElem(1, 0), static_cast<double>(ReferenceXProd(x, xz, w)),
-                        1e-11);
-        EXPECT_NEAR_REL(m->GetXProds().GetElem(1, 1),
-                        static_cast<double>(ReferenceXProd(xz, xz, w)), 1e-12);
+    for (const MCProvMeans* m : {&pm[k], &merged}) {
+        EXPECT_NEAR_REL(m->GetMeans()[0], mean, 1e-12);
+        EXPECT_NEAR_REL(m->GetXProds().GetElem(0, 0), m2, 1e-12);
+        EXPECT_NEAR_REL(m->GetXProds().GetElem(2, 0), -m2, 1e-12); // 10 - x against x
+        EXPECT_NEAR_REL(m->GetXProds().GetElem(1, 0), XProd(x, xz, w), 1e-11);
+        EXPECT_NEAR_REL(m->GetXProds().GetElem(1, 1), XProd(xz, xz, w), 1e-12);
     }
-    ASSERT_EQ(pooledCat.GetNCategories(true), wholeCat.GetNCategories(true));
-    for (int c = 0; c < wholeCat.GetNCategories(true); ++c) {
-        EXPECT_NEAR_REL(pooledCat.GetCatCount(c), wholeCat.GetCatCount(c), 1e-12);
-    }
-    EXPECT_NEAR_REL(pooledCat.GetRefusedWeight(), wholeCat.GetRefusedWeight(), 1e-12);
-    for (int b = 0; b < 12; ++b) {
-        EXPECT_NEAR_REL(pooledHist.GetBinWeight(b), wholeHist.GetBinWeight(b), 1e-12);
-    }
-    EXPECT_NEAR_REL(pooledHist.GetOverflowWeight(), wholeHist.GetOverflowWeight(), 1e-12);
-    EXPECT_NEAR_REL(pooledHist.GetVariance(), wholeHist.GetVariance(), 1e-12);
+    ExpectNearAll(pooledCat.GetCatCounts(), cat[k].GetCatCounts(), 1e-12);
+    EXPECT_NEAR_REL(pooledCat.GetRefusedWeight(), cat[k].GetRefusedWeight(), 1e-12);
+    ExpectNearAll(pooledHist.GetBinWeights(), hist[k].GetBinWeights(), 1e-12);
+    EXPECT_NEAR_REL(pooledHist.GetOverflowWeight(), hist[k].GetOverflowWeight(), 1e-12);
+    EXPECT_NEAR_REL(pooledHist.GetVariance(), hist[k].GetVariance(), 1e-12);
 }
 
 INSTANTIATE_TEST_SUITE_P(Parts, PoolSplit, ::testing::Values(2, 3, 7, 16));
 
-// Integer weights equal repeated rows.
-TEST(AccumulatorWeights, IntegerWeightsEqualRepeatedRows) {
-    std::mt19937_64 gen(31);
-    std::uniform_real_distribution<double> value(-3.0, 9.0);
-    std::uniform_int_distribution<int> reps(1, 5);
-    MCContStats s[2];
-    MCCatStats cat[2];
-    MCProvMeans pm[2] = {MCProvMeans(2, true), MCProvMeans(2, true)};
-    MCHistogramData h[2] = {MCHistogramData(8, -3.0, 9.0, true),
-                            MCHistogramData(8, -3.0, 9.0, true)};
-    for (int i = 0; i < 400; ++i) {
-        const double x = value(gen);
-        const std::vector<double> row{x, 0.5 * x * x};
-        const int r = reps(gen);
-        s[0].Update(x, r);
-        cat[0].Update(x, r);
-        pm[0].Update(row, r);
-        h[0].UpdateData(r, 1.0, x);
-        for (int j = 0; j < r; ++j) {
-            s[1].Update(x);
-            cat[1].Update(x, 1.0);
-            pm[1].Update(row, 1.0);
-            h[1].UpdateData(1.0, 1.0, x);
-        }
-    }
-    EXPECT_EQ(s[0].GetSumFreqWeights(), s[1].GetSumFreqWeights());
-    EXPECT_NEAR_REL(s[0].GetMean(), s[1].GetMean(), 1e-13);
-    EXPECT_NEAR_REL(s[0].GetVariance(), s[1].GetVariance(), 1e-12);
-    EXPECT_EQ(cat[0].GetCatCounts(), cat[1].GetCatCounts()); // sums of whole numbers: exact
-    EXPECT_EQ(cat[0].GetRefusedWeight(), cat[1].GetRefusedWeight());
-    for (int i = 0; i < 2; ++i) {
-        EXPECT_NEAR_REL(pm[0].GetMeans()[static_cast<std::size_t>(i)],
-                        pm[1].GetMeans()[static_cast<std::size_t>(i)], 1e-13);
-        for (int j = 0; j <= i; ++j) {
-            EXPECT_NEAR_REL(pm[0].GetXProds().GetElem(i, j), pm[1].GetXProds().GetElem(i, j),
-                            1e-12);
-        }
-    }
-    EXPECT_EQ(h[0].GetBinWeights(), h[1].GetBinWeights());
-    EXPECT_NEAR_REL(h[0].GetVariance(), h[1].GetVariance(), 1e-12);
-}
-
-// ------------------------------------------------------------------------------------------
-// Data far from zero keep their variance. The inputs are y = 1e9 + u with sd(u) = 1: the
-// reference is the exact variance of those doubles (y - 1e9 is exact), computed two-pass in
-// long double. Sums of raw powers would lose every digit here (Σy² ≈ 1e21 against a variance
-// of 1). West's update loses about log10(|mean|/sd) = 9 digits in the worst case; in practice
-// the errors of the running mean cancel and the result holds to about 1e-8. The bound 1e-6
-// leaves room while failing any raw-power method by many orders.
+// Data y = 1e9 + u, sd(u) = 1, keep their variance: the reference is the exact variance of
+// those doubles (y - 1e9 is exact). Sums of raw powers would lose every digit (Σy² ≈ 1e21);
+// West's update loses at most log10(|mean|/sd) = 9 digits, in practice about 8 (errors of the
+// running mean cancel), so 1e-6 fails any raw-power method by many orders. The running mean
+// carries ulp(1e9)/2 per update, a random walk of about 1e-5: 1e-13 of the mean.
 TEST(AccumulatorShift, DataShiftedBy1e9KeepTheirVariance) {
     constexpr double kShift = 1e9;
     std::mt19937_64 gen(4242);
     std::normal_distribution<double> normal(0.0, 1.0);
-    std::vector<double> y;
     std::vector<double> u;
-    std::vector<double> ones;
     MCContStats stats;
+    MCContStats halves[2];
     MCProvMeans means(2, true);
     for (int i = 0; i < 100000; ++i) {
-        y.push_back(kShift + normal(gen));
-        u.push_back(y.back() - kShift);
-        ones.push_back(1.0);
-        stats.Update(y.back());
-        means.Update(std::vector<double>{y.back(), -y.back()}, 1.0);
+        const double y = kShift + normal(gen);
+        u.push_back(y - kShift);
+        stats.Update(y);
+        halves[i % 2].Update(y);
+        means.Update(std::vector<double>{y, -y}, 1.0);
     }
-    const TwoPass ref = ReferenceMoments(u, ones);
-    const double variance = static_cast<double>(ref.fM2 / (ref.fW - 1.0L));
+    const std::vector<double> ones(u.size(), 1.0);
+    const double m2 = XProd(u, u, ones);
+    const double variance = m2 / (static_cast<double>(u.size()) - 1.0);
     EXPECT_NEAR_REL(stats.GetVariance(), variance, 1e-6);
-    // The running mean carries rounding errors of the size of ulp(1e9)/2 ≈ 6e-8 from each of
-    // its n updates, damped only slowly (a random walk of about 1e-5 here): 1e-13 relative to
-    // the mean itself.
-    EXPECT_NEAR_REL(stats.GetMean(), kShift + static_cast<double>(ref.fMean), 1e-13);
-    EXPECT_NEAR_REL(means.GetXProds().GetElem(0, 0), static_cast<double>(ref.fM2), 1e-6);
-    EXPECT_NEAR_REL(means.GetXProds().GetElem(1, 0), -static_cast<double>(ref.fM2), 1e-6);
-
-    // Pooling two shifted halves keeps it too.
-    MCContStats a;
-    MCContStats b;
-    for (std::size_t i = 0; i < y.size(); ++i) {
-        (i % 2 ? a : b).Update(y[i]);
-    }
-    a.Pool(b);
-    EXPECT_NEAR_REL(a.GetVariance(), variance, 1e-6);
+    EXPECT_NEAR_REL(stats.GetMean(), kShift + static_cast<double>(Mean(u, ones)), 1e-13);
+    EXPECT_NEAR_REL(means.GetXProds().GetElem(0, 0), m2, 1e-6);
+    EXPECT_NEAR_REL(means.GetXProds().GetElem(1, 0), -m2, 1e-6);
+    halves[0].Pool(halves[1]);
+    EXPECT_NEAR_REL(halves[0].GetVariance(), variance, 1e-6);
 }
 
 TEST(MCContStats, EmptyAndSingleValueReportMissing) {
@@ -227,10 +165,8 @@ TEST(MCContStats, EmptyAndSingleValueReportMissing) {
     double lo = 0.0;
     double hi = 0.0;
     EXPECT_FALSE(s.GetExtrema(lo, hi));
-    EXPECT_TRUE(MCMV::IsMissing(lo) && MCMV::IsMissing(hi));
-    EXPECT_TRUE(MCMV::IsMissing(s.GetMean()));
+    EXPECT_TRUE(MCMV::IsMissing(lo) && MCMV::IsMissing(hi) && MCMV::IsMissing(s.GetMean()));
     s.Update(7.0);
-    EXPECT_EQ(s.GetMean(), 7.0);
     EXPECT_TRUE(MCMV::IsMissing(s.GetVariance())); // W = 1: no sample variance
     MCContStats copy = s;
     s.Pool(s); // pooling with itself doubles the data: 7, 7
@@ -252,42 +188,37 @@ class RefusedUpdate : public ::testing::TestWithParam<BadUpdate> {};
 TEST_P(RefusedUpdate, NothingChanges) {
     const BadUpdate& c = GetParam();
     MCContStats s;
-    s.Update(1.0);
     MCProvMeans pm(1, true);
-    pm.Update(std::vector<double>{1.0}, 1.0);
     MCHistogramData h(4, 0.0, 4.0, true);
-    h.UpdateData(1.0, 1.0, 1.0);
     MCCatStats cat;
-    cat.Update(1.0, 1.0);
-
+    ASSERT_TRUE(s.Update(1.0) && pm.Update(std::vector<double>{1.0}, 1.0) &&
+                h.UpdateData(1.0, 1.0, 1.0) && cat.Update(1.0, 1.0));
     EXPECT_FALSE(s.Update(c.fX, c.fWeight));
     EXPECT_FALSE(pm.Update(std::vector<double>{c.fX}, c.fWeight));
     EXPECT_FALSE(h.UpdateData(c.fWeight, 1.0, c.fX));
     EXPECT_FALSE(cat.Update(c.fX, c.fWeight));
-    EXPECT_EQ(s.GetCount(), 1);
-    EXPECT_EQ(s.GetMean(), 1.0);
-    EXPECT_EQ(pm.GetCount(), 1);
-    EXPECT_EQ(pm.GetMeans()[0], 1.0);
-    EXPECT_EQ(h.GetTotalWeight(), 1.0);
-    EXPECT_EQ(h.GetMean(), 1.0);
+    EXPECT_TRUE(s.GetCount() == 1 && s.GetMean() == 1.0);
+    EXPECT_TRUE(pm.GetCount() == 1 && pm.GetMeans()[0] == 1.0);
+    EXPECT_TRUE(h.GetTotalWeight() == 1.0 && h.GetMean() == 1.0);
     EXPECT_EQ(cat.GetSumCounts(), 1.0);
 }
 
-INSTANTIATE_TEST_SUITE_P(
-    Table, RefusedUpdate,
-    ::testing::Values(BadUpdate{"MissingValue", kNaN, 1.0}, BadUpdate{"InfiniteValue", kInf, 1.0},
-                      BadUpdate{"MinusInfinity", -kInf, 1.0}, BadUpdate{"ZeroWeight", 2.0, 0.0},
-                      BadUpdate{"NegativeWeight", 2.0, -1.0}, BadUpdate{"MissingWeight", 2.0, kNaN},
-                      BadUpdate{"InfiniteWeight", 2.0, kInf}),
+// clang-format off
+INSTANTIATE_TEST_SUITE_P(Table, RefusedUpdate, ::testing::Values(
+    BadUpdate{"MissingValue", kNaN, 1.0}, BadUpdate{"InfiniteValue", kInf, 1.0},
+    BadUpdate{"MinusInfinity", -kInf, 1.0}, BadUpdate{"ZeroWeight", 2.0, 0.0},
+    BadUpdate{"NegativeWeight", 2.0, -1.0}, BadUpdate{"MissingWeight", 2.0, kNaN},
+    BadUpdate{"InfiniteWeight", 2.0, kInf}),
     [](const ::testing::TestParamInfo<BadUpdate>& p) { return p.param.fName; });
+// clang-format on
 
 // ------------------------------------------------------------------------------------------
-// MCCatStats: category of a value.
+// MCCatStats: the category of a value, -1 when refused.
 
 struct CatCase {
     const char* fName;
     double fValue;
-    int fCategory; //!< -1: refused
+    int fCategory;
 };
 
 class CatStatsCategory : public ::testing::TestWithParam<CatCase> {};
@@ -296,27 +227,23 @@ TEST_P(CatStatsCategory, ValueCountsForItsCategory) {
     const CatCase& c = GetParam();
     MCCatStats s;
     EXPECT_EQ(s.Update(c.fValue, 2.5), c.fCategory >= 0);
-    if (c.fCategory < 0) {
-        EXPECT_EQ(s.GetSumCounts(), 0.0);
-        EXPECT_EQ(s.GetNCategories(true), 0);
-        EXPECT_EQ(s.GetRefusedWeight(), 2.5);
-        return;
-    }
-    EXPECT_EQ(s.GetCatCount(c.fCategory), 2.5);
+    EXPECT_EQ(s.GetRefusedWeight(), c.fCategory < 0 ? 2.5 : 0.0);
     EXPECT_EQ(s.GetNCategories(true), c.fCategory + 1);
-    EXPECT_EQ(s.GetNCategories(false), 1);
+    if (c.fCategory >= 0) {
+        EXPECT_EQ(s.GetCatCount(c.fCategory), 2.5);
+    }
 }
 
-INSTANTIATE_TEST_SUITE_P(
-    Table, CatStatsCategory,
-    ::testing::Values(
-        CatCase{"Zero", 0.0, 0}, CatCase{"Whole", 3.0, 3}, CatCase{"RoundsDown", 2.4, 2},
-        CatCase{"HalfRoundsUp", 2.5, 3}, CatCase{"SmallNegative", -0.4, 0},
-        CatCase{"MinusHalf", -0.5, -1}, CatCase{"Negative", -3.0, -1}, CatCase{"Missing", kNaN, -1},
-        CatCase{"Infinite", kInf, -1},
-        CatCase{"LargestCategory", MCCatStats::kMaxCategory, MCCatStats::kMaxCategory},
-        CatCase{"BeyondLargest", MCCatStats::kMaxCategory + 1.0, -1}, CatCase{"Huge", 1e300, -1}),
+// clang-format off
+INSTANTIATE_TEST_SUITE_P(Table, CatStatsCategory, ::testing::Values(
+    CatCase{"Zero", 0.0, 0}, CatCase{"Whole", 3.0, 3}, CatCase{"RoundsDown", 2.4, 2},
+    CatCase{"HalfRoundsUp", 2.5, 3}, CatCase{"SmallNegative", -0.4, 0},
+    CatCase{"MinusHalf", -0.5, -1}, CatCase{"Negative", -3.0, -1}, CatCase{"Missing", kNaN, -1},
+    CatCase{"Infinite", kInf, -1},
+    CatCase{"LargestCategory", MCCatStats::kMaxCategory, MCCatStats::kMaxCategory},
+    CatCase{"BeyondLargest", MCCatStats::kMaxCategory + 1.0, -1}, CatCase{"Huge", 1e300, -1}),
     [](const ::testing::TestParamInfo<CatCase>& p) { return p.param.fName; });
+// clang-format on
 
 TEST(MCCatStats, GapsCountAsEmptyCategories) {
     MCCatStats s;
@@ -324,11 +251,9 @@ TEST(MCCatStats, GapsCountAsEmptyCategories) {
     s.Update(4.0, 2.0);
     s.Update(4.2, 1.0);
     EXPECT_EQ(s.GetCatCounts(), (std::vector<double>{1.0, 0.0, 0.0, 0.0, 3.0}));
-    EXPECT_EQ(s.GetNCategories(true), 5);
     EXPECT_EQ(s.GetNCategories(false), 2);
     EXPECT_EQ(s.GetCatCount(7), 0.0);
     EXPECT_EQ(s.GetCatCount(-1), 0.0);
-    EXPECT_EQ(s.GetSumCounts(), 4.0);
     s.Pool(s);
     EXPECT_EQ(s.GetCatCount(4), 6.0);
     EXPECT_EQ(s.GetSumCounts(), 8.0);
@@ -342,24 +267,18 @@ TEST(MCMeansXProdData, MergeRefusesAMismatchAndKeepsItsState) {
     three.Update(std::vector<double>{1.0, 2.0, 3.0}, 1.0);
     three.Update(std::vector<double>{2.0, 0.0, 5.0}, 2.0);
     const MCProvMeans before = three;
-
     MCProvMeans two(2, true);
     two.Update(std::vector<double>{1.0, 2.0}, 1.0);
-    EXPECT_FALSE(three.Merge(two));
-    EXPECT_FALSE(two.Merge(three));
     MCProvMeans meansOnly(3, false);
     meansOnly.Update(std::vector<double>{1.0, 2.0, 3.0}, 1.0);
+    EXPECT_FALSE(three.Merge(two));
+    EXPECT_FALSE(two.Merge(three));
     EXPECT_FALSE(three.Merge(meansOnly));
-    EXPECT_EQ(meansOnly.GetXProds().GetNRows(), 0);
-
+    EXPECT_FALSE(three.Update(std::vector<double>{1.0, 2.0}, 1.0)); // row of the wrong length
     EXPECT_EQ(three.GetCount(), before.GetCount());
     EXPECT_EQ(three.GetMeans(), before.GetMeans());
     EXPECT_TRUE(three.GetXProds() == before.GetXProds());
-
-    // A row of the wrong length is refused too.
-    EXPECT_FALSE(three.Update(std::vector<double>{1.0, 2.0}, 1.0));
-    // An empty accumulator of the same shape merges as a no-op; merging into an empty one
-    // copies.
+    // An empty accumulator of the same shape merges as a no-op; merging into one copies.
     EXPECT_TRUE(three.Merge(MCProvMeans(3, true)));
     MCProvMeans empty(3, true);
     EXPECT_TRUE(empty.Merge(three));
@@ -381,12 +300,12 @@ TEST(MCMeansXProdData, MergeWithItselfDoublesTheWeights) {
 }
 
 // ------------------------------------------------------------------------------------------
-// MCHistogramData: where a value goes.
+// MCHistogramData: where a value goes (-1 underflow, 10 overflow).
 
 struct BinCase {
     const char* fName;
     double fX;
-    int fBin; //!< -1 underflow, -2 overflow
+    int fBin;
 };
 
 class HistogramBin : public ::testing::TestWithParam<BinCase> {};
@@ -397,20 +316,20 @@ TEST_P(HistogramBin, ValueLandsInItsBin) {
     ASSERT_TRUE(h.UpdateData(2.0, 1.0, c.fX));
     EXPECT_EQ(h.GetTotalWeight(), 2.0);
     EXPECT_EQ(h.GetUnderflowWeight(), c.fBin == -1 ? 2.0 : 0.0);
-    EXPECT_EQ(h.GetOverflowWeight(), c.fBin == -2 ? 2.0 : 0.0);
+    EXPECT_EQ(h.GetOverflowWeight(), c.fBin == 10 ? 2.0 : 0.0);
     for (int b = 0; b < 10; ++b) {
         EXPECT_EQ(h.GetBinWeight(b), b == c.fBin ? 2.0 : 0.0) << "bin " << b;
     }
 }
 
-INSTANTIATE_TEST_SUITE_P(
-    Table, HistogramBin,
-    ::testing::Values(BinCase{"Minimum", 0.0, 0}, BinCase{"InsideFirst", 0.999, 0},
-                      BinCase{"Edge", 1.0, 1}, BinCase{"Middle", 5.5, 5},
-                      BinCase{"JustBelowMaximum", 9.999, 9}, BinCase{"MaximumInLastBin", 10.0, 9},
-                      BinCase{"Below", -0.5, -1}, BinCase{"Above", 10.5, -2},
-                      BinCase{"TinyAboveMaximum", std::nextafter(10.0, 11.0), -2}),
+// clang-format off
+INSTANTIATE_TEST_SUITE_P(Table, HistogramBin, ::testing::Values(
+    BinCase{"Minimum", 0.0, 0}, BinCase{"InsideFirst", 0.999, 0}, BinCase{"Edge", 1.0, 1},
+    BinCase{"Middle", 5.5, 5}, BinCase{"JustBelowMaximum", 9.999, 9},
+    BinCase{"MaximumInLastBin", 10.0, 9}, BinCase{"Below", -0.5, -1}, BinCase{"Above", 10.5, 10},
+    BinCase{"TinyAboveMaximum", std::nextafter(10.0, 11.0), 10}),
     [](const ::testing::TestParamInfo<BinCase>& p) { return p.param.fName; });
+// clang-format on
 
 TEST(MCHistogramData, DegenerateRangeTakesEveryValueInOneBin) {
     for (const auto& range : {std::pair<double, double>{3.0, 3.0}, {5.0, 1.0}, {0.0, kInf}}) {
@@ -420,7 +339,6 @@ TEST(MCHistogramData, DegenerateRangeTakesEveryValueInOneBin) {
         h.UpdateData(1.0, 1.0, -100.0);
         h.UpdateData(1.0, 1.0, 3.0);
         EXPECT_EQ(h.GetBinWeight(0), 2.0);
-        EXPECT_EQ(h.GetTotalWeight(), 2.0);
     }
 }
 
@@ -442,3 +360,5 @@ TEST(MCHistogramData, MomentsUseBothWeightsAndMergeChecksTheBins) {
     EXPECT_EQ(h.GetBinWeights(), before.GetBinWeights());
     EXPECT_EQ(h.GetTotalWeight(), before.GetTotalWeight());
 }
+
+} // namespace

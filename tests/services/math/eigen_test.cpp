@@ -57,34 +57,20 @@ Eigen::MatrixXd ClipAndRescale(const MCSymMatrix& m, double eps) {
 TEST(MCEigenValues, KnownSpectra) {
     // [[2, 1], [1, 2]]: 1 and 3. Equicorrelation ρ in 3 dimensions: 1 − ρ twice, 1 + 2ρ.
     // Tridiagonal (−1, 2, −1) of order 4: 2 − 2cos(kπ/5), k = 1..4.
-    const MCEigenValues a(Matrix(2, {2, 1, 2}), 1e-12, 30);
-    ASSERT_TRUE(a.IsValid());
-    EXPECT_NEAR_REL(a.GetEigenValues()[0], 1.0, 1e-14);
-    EXPECT_NEAR_REL(a.GetEigenValues()[1], 3.0, 1e-14);
-
-    const MCEigenValues b(Matrix(3, {1, 0.4, 1, 0.4, 0.4, 1}), 1e-12, 30);
-    ASSERT_EQ(b.GetEigenValues().size(), 3u);
-    EXPECT_NEAR_REL(b.GetEigenValues()[0], 0.6, 1e-14);
-    EXPECT_NEAR_REL(b.GetEigenValues()[1], 0.6, 1e-14);
-    EXPECT_NEAR_REL(b.GetEigenValues()[2], 1.8, 1e-14);
-
-    const MCEigenValues c(Matrix(4, {2, -1, 2, 0, -1, 2, 0, 0, -1, 2}), 1e-12, 30);
     const double pi = std::acos(-1.0);
-    for (int k = 1; k <= 4; ++k) {
-        EXPECT_NEAR_TOL(c.GetEigenValues()[static_cast<std::size_t>(k - 1)],
-                        2.0 - 2.0 * std::cos(k * pi / 5.0), 1e-14, 1e-15);
+    const auto tri = [pi](int k) { return 2.0 - 2.0 * std::cos(k * pi / 5.0); };
+    const std::pair<MCSymMatrix, std::vector<double>> cases[] = {
+        {Matrix(2, {2, 1, 2}), {1.0, 3.0}},
+        {Matrix(3, {1, 0.4, 1, 0.4, 0.4, 1}), {0.6, 0.6, 1.8}},
+        {Matrix(4, {2, -1, 2, 0, -1, 2, 0, 0, -1, 2}), {tri(1), tri(2), tri(3), tri(4)}}};
+    for (const auto& [matrix, expected] : cases) {
+        const MCEigenValues eigen(matrix, 1e-12, 30);
+        ASSERT_TRUE(eigen.IsValid());
+        ASSERT_EQ(eigen.GetEigenValues().size(), expected.size());
+        for (std::size_t i = 0; i < expected.size(); ++i) {
+            EXPECT_NEAR_TOL(eigen.GetEigenValues()[i], expected[i], 1e-14, 1e-15);
+        }
     }
-}
-
-TEST(MCEigenValues, PositiveDefiniteInputIsReturnedUntouched) {
-    const MCSymMatrix q = Matrix(3, {1, 0.5, 1, -0.2, 0.3, 1});
-    MCEigenValues eigen(q, 1e-12, 30);
-    MCSymMatrix out;
-    bool adjusted = true;
-    ASSERT_TRUE(eigen.GetPDHMatrix(1e-6, out, adjusted));
-    EXPECT_FALSE(adjusted);
-    EXPECT_TRUE(out == q);
-    EXPECT_EQ(eigen.GetIterations(), 0);
 }
 
 TEST(MCEigenValues, HighamsExampleReachesThePublishedNearestCorrelationMatrix) {
@@ -133,29 +119,28 @@ TEST_P(RepairOfIndefinite, GivesANearbyPositiveDefiniteCorrelationMatrix) {
     const double distance = (Dense(out) - Dense(q)).norm();
     const double clipDistance = (ClipAndRescale(q, eps) - Dense(q)).norm();
     EXPECT_LE(distance, clipDistance + 10.0 * eps) << distance - clipDistance;
-    // The repaired matrix is accepted as it is by a second repair.
+    // A positive definite matrix, such as the repaired one, is returned untouched.
     MCEigenValues again(out, 1e-12, 30);
     MCSymMatrix twice;
-    bool adjustedAgain = true;
-    ASSERT_TRUE(again.GetPDHMatrix(0.5 * eps, twice, adjustedAgain));
-    EXPECT_FALSE(adjustedAgain);
+    ASSERT_TRUE(again.GetPDHMatrix(0.5 * eps, twice, adjusted));
+    EXPECT_FALSE(adjusted);
+    EXPECT_TRUE(twice == out);
+    EXPECT_EQ(again.GetIterations(), 0);
 }
 
-INSTANTIATE_TEST_SUITE_P(
-    Matrices, RepairOfIndefinite,
-    ::testing::Values(
-        // Three variables pairwise estimated with incompatible signs.
-        RepairCase{"IncompatibleSigns", Matrix(3, {1, 0.9, 1, 0.9, -0.9, 1})},
-        // Slightly indefinite, as the copula estimates usually are.
-        RepairCase{"SlightlyIndefinite", Matrix(3, {1, 0.95, 1, 0.7, 0.95, 1})},
-        // Semi-definite: two identical variables.
-        RepairCase{"SemiDefinite", Matrix(2, {1, 1, 1})},
-        // Positive definite but numerically singular: smallest eigenvalue 1e-9 < eps.
-        RepairCase{"NearlySingular", Matrix(2, {1, 1.0 - 1e-9, 1})},
-        // Six variables with a block of contradicting correlations.
-        RepairCase{"SixVariables", Matrix(6, {1,   0.8, 1,    0.8, -0.7, 1,   0.1, 0.2, 0.3, 1, 0.5,
-                                              0.5, 0.5, -0.6, 1,   0.9,  0.9, 0.9, 0.1, 0.2, 1})}),
-    [](const ::testing::TestParamInfo<RepairCase>& paramInfo) { return paramInfo.param.fName; });
+// Incompatible signs of pairwise estimates; slightly indefinite, as copula estimates usually
+// are; semi-definite (two identical variables); positive definite but numerically singular
+// (smallest eigenvalue 1e-9 < eps); six variables with a block of contradicting correlations.
+// clang-format off
+INSTANTIATE_TEST_SUITE_P(Matrices, RepairOfIndefinite, ::testing::Values(
+    RepairCase{"IncompatibleSigns", Matrix(3, {1, 0.9, 1, 0.9, -0.9, 1})},
+    RepairCase{"SlightlyIndefinite", Matrix(3, {1, 0.95, 1, 0.7, 0.95, 1})},
+    RepairCase{"SemiDefinite", Matrix(2, {1, 1, 1})},
+    RepairCase{"NearlySingular", Matrix(2, {1, 1.0 - 1e-9, 1})},
+    RepairCase{"SixVariables", Matrix(6, {1, 0.8, 1, 0.8, -0.7, 1, 0.1, 0.2, 0.3, 1, 0.5, 0.5, 0.5,
+                                          -0.6, 1, 0.9, 0.9, 0.9, 0.1, 0.2, 1})}),
+    [](const ::testing::TestParamInfo<RepairCase>& p) { return p.param.fName; });
+// clang-format on
 
 TEST(MCEigenValues, NoRepairForUnusableInput) {
     const double nan = std::numeric_limits<double>::quiet_NaN();
@@ -165,19 +150,16 @@ TEST(MCEigenValues, NoRepairForUnusableInput) {
     MCEigenValues withNaN(Matrix(2, {1, nan, 1}), 1e-12, 30);
     EXPECT_FALSE(withNaN.IsValid());
     EXPECT_FALSE(withNaN.GetPDHMatrix(1e-6, out, adjusted));
-
     MCEigenValues empty(MCSymMatrix(), 1e-12, 30);
     EXPECT_FALSE(empty.GetPDHMatrix(1e-6, out, adjusted));
-
+    // An eps outside (0, 1) is refused.
     MCEigenValues fine(Matrix(2, {1, 0.5, 1}), 1e-12, 30);
     EXPECT_FALSE(fine.GetPDHMatrix(0.0, out, adjusted));
     EXPECT_FALSE(fine.GetPDHMatrix(1.0, out, adjusted));
     EXPECT_FALSE(fine.GetPDHMatrix(nan, out, adjusted));
 
     // Failures leave the caller's values alone.
-    EXPECT_EQ(out.GetNRows(), 1);
-    EXPECT_EQ(out.GetElem(0, 0), 7.0);
-    EXPECT_TRUE(adjusted);
+    EXPECT_TRUE(out.GetNRows() == 1 && out.GetElem(0, 0) == 7.0 && adjusted);
 }
 
 } // namespace

@@ -15,6 +15,7 @@
 #include <numeric>
 #include <stdexcept>
 #include <thread>
+#include <tuple>
 #include <vector>
 
 using MCCommon_800::MCMV;
@@ -25,19 +26,12 @@ namespace {
 
 // Beta log-likelihood from its sufficient statistics n, S1 = Σ ln x, S2 = Σ ln(1-x):
 //   LL(a, b) = n·(lnΓ(a+b) - lnΓ(a) - lnΓ(b)) + (a-1)·S1 + (b-1)·S2.
-// The accumulator holds -LL, its gradient and Hessian, and the constraints a ≥ 1e-5, b ≥ 1e-5
-// plus any rows a test adds.
-class BetaAccum : public IMCOptAccumStats {
-public:
+// The accumulator holds -LL, its gradient and Hessian, and the constraint rows.
+struct BetaAccum : IMCOptAccumStats {
     BetaAccum(std::vector<double>* params, double n, double s1, double s2)
         : fpParams(params), fN(n), fS1(s1), fS2(s2) {
         fHessian.SetNRows(2);
     }
-
-    void AddConstraint(std::vector<double> coeffs, double constant) {
-        fvRows.push_back({std::move(coeffs), constant});
-    }
-
     void Reset(int, bool) override {
         fObjective = 0.0;
         fvScores.assign(2, 0.0);
@@ -47,25 +41,17 @@ public:
     double GetObjective() const override { return fObjective; }
     const std::vector<double>& GetScores() const override { return fvScores; }
     void GetHessian(MCSymMatrix& out) const override { out = fHessian; }
-    int GetNConstr() const override { return 2 + static_cast<int>(fvRows.size()); }
+    int GetNConstr() const override { return static_cast<int>(fvRows.size()); }
     bool GetConstrVarCoeff(int index, std::vector<double>& coeffs,
                            double& constant) const override {
         if (index < 0 || index >= GetNConstr()) {
             return false;
         }
-        coeffs.assign(2, 0.0);
-        if (index < 2) {
-            coeffs[static_cast<std::size_t>(index)] = 1.0;
-            constant = -1e-5;
-            return true;
-        }
-        coeffs = fvRows[static_cast<std::size_t>(index - 2)].first;
-        constant = fvRows[static_cast<std::size_t>(index - 2)].second;
+        std::tie(coeffs, constant) = fvRows[static_cast<std::size_t>(index)];
         return true;
     }
     void GetCounts(int& valid, int& invalid, double& weight) const override {
-        valid = 0;
-        invalid = 0;
+        valid = invalid = 0;
         weight = fN;
     }
     MCStatus GetStatus() const override { return MCStatus(); }
@@ -91,21 +77,19 @@ public:
         return true;
     }
 
-private:
     std::vector<double>* fpParams;
-    double fN;
-    double fS1;
-    double fS2;
+    double fN, fS1, fS2;
     double fObjective = 0.0;
     std::vector<double> fvScores{0.0, 0.0};
     MCSymMatrix fHessian;
-    std::vector<std::pair<std::vector<double>, double>> fvRows;
+    //! Constraint rows c·θ + constant ≥ 0: the bounds a, b ≥ 1e-5, then any a test adds.
+    std::vector<std::pair<std::vector<double>, double>> fvRows{{{1.0, 0.0}, -1e-5},
+                                                               {{0.0, 1.0}, -1e-5}};
 };
 
 // A data handler without records: each evaluation only finishes the accumulator. It records
 // the flags of every call and can fail (or throw) at a chosen call.
-class StatsHandler : public IMCOptDataHandler {
-public:
+struct StatsHandler : IMCOptDataHandler {
     void SetAccumStats(IMCOptAccumStats* accum) override { fpAccum = accum; }
     void ResetAccumStats(int mode, bool check) override {
         if (fpAccum) {
@@ -126,23 +110,18 @@ public:
             }
             return fFailStatus;
         }
-        if (!fpAccum->FinishComputations((flags & 6) ? 1 : 0)) {
-            return fpAccum->GetStatus();
-        }
-        return MCStatus();
+        return fpAccum->FinishComputations((flags & 6) ? 1 : 0) ? MCStatus() : fpAccum->GetStatus();
     }
     const std::vector<MCStatus>& GetWarnings() const override { return fvWarnings; }
     void EndOptimization() override { ++fEnded; }
 
+    IMCOptAccumStats* fpAccum = nullptr;
+    std::vector<MCStatus> fvWarnings;
     std::vector<int> fvFlags; //!< flags of every call
     int fFailAt = -1;         //!< call (from 1) that fails
     MCStatus fFailStatus;     //!< what it returns
     bool fbThrow = false;     //!< throw instead
     int fEnded = 0;           //!< EndOptimization calls
-
-private:
-    IMCOptAccumStats* fpAccum = nullptr;
-    std::vector<MCStatus> fvWarnings;
 };
 
 // Data sets x_i = g((i + 0.5)/n), i = 0 .. n-1, and their reference estimates, computed with
@@ -164,45 +143,31 @@ private:
 //
 // On the line a + b = s the term lnΓ(a+b) is constant, so the constrained maximum solves
 // ψ(s-t) - ψ(t) = (S2 - S1)/n with a = t.
-enum class Shape { kSquare, kSqrt, kNarrow, kCube };
-
 struct BetaCase {
     const char* fName;
-    Shape fShape;
+    double (*fData)(double u); //!< x = g(u)
     int fN;
     double fA, fB;               //!< unconstrained estimate
     double fBoundA, fBoundB;     //!< estimate under a ≤ fBoundA
     double fSum, fLineA, fLineB; //!< estimate under a + b ≤ fSum
 };
 
+// clang-format off
 const BetaCase kBetaCases[] = {
-    {"Square40", Shape::kSquare, 40, 0.51061011618689355279, 1.0265246553492867695,
-     0.40848809294951484223, 0.88799367219835992807, 1.0759943400753262256, 0.38978764557834553845,
-     0.68620669449698068718},
-    {"Sqrt200", Shape::kSqrt, 200, 2.0112983546250382372, 1.0049457598199743262,
-     1.6090386837000305897, 0.87568043270245783639, 2.1113708801115087944, 1.3655313281929311952,
-     0.74583955191857759913},
-    {"Narrow25", Shape::kNarrow, 25, 9.170442851348686019, 9.170442851348686019,
-     7.3363542810789488152, 7.4331557939382639741, 12.838619991888160427, 6.4193099959440802133,
-     6.4193099959440802133},
-    {"Cube60", Shape::kCube, 60, 0.33762522776087413198, 1.0192946775589153125,
-     0.27010018220869930559, 0.88065710160898133064, 0.94984393372385261112, 0.27486082864741401535,
-     0.67498310507643859576},
+    {"Square40", [](double u) { return u * u; }, 40, 0.51061011618689355279, 1.0265246553492867695,
+     0.40848809294951484223, 0.88799367219835992807, 1.0759943400753262256,
+     0.38978764557834553845, 0.68620669449698068718},
+    {"Sqrt200", [](double u) { return std::sqrt(u); }, 200, 2.0112983546250382372,
+     1.0049457598199743262, 1.6090386837000305897, 0.87568043270245783639, 2.1113708801115087944,
+     1.3655313281929311952, 0.74583955191857759913},
+    {"Narrow25", [](double u) { return 0.3 + 0.4 * u; }, 25, 9.170442851348686019,
+     9.170442851348686019, 7.3363542810789488152, 7.4331557939382639741, 12.838619991888160427,
+     6.4193099959440802133, 6.4193099959440802133},
+    {"Cube60", [](double u) { return u * u * u; }, 60, 0.33762522776087413198,
+     1.0192946775589153125, 0.27010018220869930559, 0.88065710160898133064,
+     0.94984393372385261112, 0.27486082864741401535, 0.67498310507643859576},
 };
-
-double DataPoint(Shape shape, double u) {
-    switch (shape) {
-    case Shape::kSquare:
-        return u * u;
-    case Shape::kSqrt:
-        return std::sqrt(u);
-    case Shape::kNarrow:
-        return 0.3 + 0.4 * u;
-    case Shape::kCube:
-        return u * u * u;
-    }
-    return u;
-}
+// clang-format on
 
 // One Beta problem: the parameter vector (starting at the moment estimates, divisor n-1, as
 // the fitting does), its accumulator and a handler.
@@ -212,7 +177,7 @@ struct BetaProblem {
         double s1 = 0.0;
         double s2 = 0.0;
         for (int i = 0; i < c.fN; ++i) {
-            x.push_back(DataPoint(c.fShape, (i + 0.5) / c.fN));
+            x.push_back(c.fData((i + 0.5) / c.fN));
             s1 += std::log(x.back());
             s2 += std::log1p(-x.back());
         }
@@ -238,15 +203,15 @@ struct BetaProblem {
     std::unique_ptr<IMCOptimizer> fpOptimizer;
 };
 
-MCOptimParams WithRule(int rule) {
+// The default settings (Hessian at the end, parameter rule, constraints with start repair)
+// are those of the fitting; these change one or two of them.
+MCOptimParams With(int MCOptimParams::*field, int value, int MCOptimParams::*field2 = nullptr,
+                   int value2 = 0) {
     MCOptimParams p;
-    p.fConvergenceRule = rule;
-    return p;
-}
-
-MCOptimParams WithEvaluations(int n) {
-    MCOptimParams p;
-    p.fMaxEvaluations = n;
+    p.*field = value;
+    if (field2 != nullptr) {
+        p.*field2 = value2;
+    }
     return p;
 }
 
@@ -254,30 +219,20 @@ MCOptimParams WithEvaluations(int n) {
 // last steps are superlinear but not yet quadratic, and leave errors up to about 1e-8 here.
 constexpr double kEstimateTol = 1e-7;
 
-bool NoCallMixesValueAndDerivatives(const std::vector<int>& flags) {
-    return std::none_of(flags.begin(), flags.end(), [](int f) {
-        return (f & kOptCompObjective) && (f & (kOptCompScores | kOptCompHessian));
-    });
+void ExpectEstimate(const std::vector<double>& params, double a, double b, double rel) {
+    EXPECT_NEAR_REL(params[0], a, rel);
+    EXPECT_NEAR_REL(params[1], b, rel);
 }
 
 class BetaFit : public ::testing::TestWithParam<BetaCase> {};
 
-} // namespace
-
 TEST_P(BetaFit, ReachesTheMaximumLikelihoodEstimate) {
     const BetaCase& c = GetParam();
     BetaProblem p(c);
-    // The settings the fitting uses: Hessian at the end, parameter rule, constraints with
-    // start repair.
-    MCOptimParams settings;
-    settings.fDerivativeLevel = 2;
-    settings.fConvergenceRule = 1;
-    settings.fConstraintMode = 3;
-    const MCStatus status = p.Run(settings);
+    const MCStatus status = p.Run();
     ASSERT_TRUE(status.IsOK()) << status.GetErrorCode();
     EXPECT_EQ(p.fHandler.GetAccumStats(), p.fpAccum.get());
-    EXPECT_NEAR_REL(p.fvParams[0], c.fA, kEstimateTol);
-    EXPECT_NEAR_REL(p.fvParams[1], c.fB, kEstimateTol);
+    ExpectEstimate(p.fvParams, c.fA, c.fB, kEstimateTol);
     // The accumulator holds the estimate's objective, scores (near 0 at an interior maximum)
     // and Hessian: the last call asked for all of them.
     EXPECT_EQ(p.fpAccum->GetObjective(), p.fpOptimizer->GetObjective());
@@ -285,7 +240,9 @@ TEST_P(BetaFit, ReachesTheMaximumLikelihoodEstimate) {
     for (double s : p.fpAccum->GetScores()) {
         EXPECT_LT(std::fabs(s), 1e-5 * c.fN);
     }
-    EXPECT_TRUE(NoCallMixesValueAndDerivatives(p.fHandler.fvFlags));
+    for (const int f : p.fHandler.fvFlags) { // no call mixes value and derivatives
+        EXPECT_FALSE((f & kOptCompObjective) && (f & (kOptCompScores | kOptCompHessian))) << f;
+    }
     EXPECT_EQ(p.fHandler.fEnded, 1);
     EXPECT_LT(p.fpOptimizer->GetNEvaluations(), 200);
 }
@@ -293,19 +250,18 @@ TEST_P(BetaFit, ReachesTheMaximumLikelihoodEstimate) {
 TEST_P(BetaFit, StopsOnAnActiveBoundOrRow) {
     const BetaCase& c = GetParam();
     BetaProblem bound(c);
-    bound.fpAccum->AddConstraint({-1.0, 0.0}, c.fBoundA); // a ≤ fBoundA: passed as a bound
+    bound.fpAccum->fvRows.push_back({{-1.0, 0.0}, c.fBoundA}); // a ≤ fBoundA: passed as a bound
     ASSERT_TRUE(bound.Run().IsOK());
     EXPECT_LE(bound.fvParams[0], c.fBoundA);
+    ExpectEstimate(bound.fvParams, c.fBoundA, c.fBoundB, kEstimateTol);
     EXPECT_NEAR_REL(bound.fvParams[0], c.fBoundA, 1e-10);
-    EXPECT_NEAR_REL(bound.fvParams[1], c.fBoundB, kEstimateTol);
 
     BetaProblem row(c);
-    row.fpAccum->AddConstraint({-1.0, -1.0}, c.fSum); // a + b ≤ fSum: a general row
+    row.fpAccum->fvRows.push_back({{-1.0, -1.0}, c.fSum}); // a + b ≤ fSum: a general row
     ASSERT_TRUE(row.Run().IsOK());
     // Feasible up to the row tolerance 1e-11, and on the row.
     EXPECT_LE(row.fvParams[0] + row.fvParams[1], c.fSum + 1e-11 * std::max(1.0, c.fSum));
-    EXPECT_NEAR_REL(row.fvParams[0], c.fLineA, kEstimateTol);
-    EXPECT_NEAR_REL(row.fvParams[1], c.fLineB, kEstimateTol);
+    ExpectEstimate(row.fvParams, c.fLineA, c.fLineB, kEstimateTol);
 }
 
 TEST_P(BetaFit, OtherRulesAndMethodsReachTheEstimateToo) {
@@ -313,18 +269,16 @@ TEST_P(BetaFit, OtherRulesAndMethodsReachTheEstimateToo) {
     // A relative objective change of 1e-12 leaves a parameter error of about
     // sqrt(1e-12·|LL|/(n·ψ')), below 1e-6 here.
     BetaProblem byObjective(c);
-    ASSERT_TRUE(byObjective.Run(WithRule(2)).IsOK());
-    EXPECT_NEAR_REL(byObjective.fvParams[0], c.fA, 1e-5);
-    EXPECT_NEAR_REL(byObjective.fvParams[1], c.fB, 1e-5);
+    ASSERT_TRUE(byObjective.Run(With(&MCOptimParams::fConvergenceRule, 2)).IsOK());
+    ExpectEstimate(byObjective.fvParams, c.fA, c.fB, 1e-5);
 
     // COBYLA's linear models end less sharply than SLSQP.
     BetaProblem derivativeFree(c);
-    MCOptimParams settings;
-    settings.fDerivativeLevel = 0;
-    settings.fMaxEvaluations = 5000;
-    ASSERT_TRUE(derivativeFree.Run(settings).IsOK());
-    EXPECT_NEAR_REL(derivativeFree.fvParams[0], c.fA, 1e-5);
-    EXPECT_NEAR_REL(derivativeFree.fvParams[1], c.fB, 1e-5);
+    ASSERT_TRUE(
+        derivativeFree
+            .Run(With(&MCOptimParams::fDerivativeLevel, 0, &MCOptimParams::fMaxEvaluations, 5000))
+            .IsOK());
+    ExpectEstimate(derivativeFree.fvParams, c.fA, c.fB, 1e-5);
     for (int f : derivativeFree.fHandler.fvFlags) {
         EXPECT_TRUE(f == kOptCompObjective || f == kOptCompScores);
     }
@@ -335,22 +289,11 @@ INSTANTIATE_TEST_SUITE_P(Reference, BetaFit, ::testing::ValuesIn(kBetaCases),
 
 // ------------------------------------------------------------------------------------------
 
-TEST(MCOptimizer, StartOutsideTheBoundsIsMovedInsideOnRequest) {
-    for (const int mode : {1, 3}) {
-        BetaProblem p(kBetaCases[0]);
-        p.fvParams = {-2.0, 0.5};
-        MCOptimParams settings;
-        settings.fConstraintMode = mode;
-        const MCStatus status = p.Run(settings);
-        if (mode == 1) {
-            EXPECT_EQ(status.GetErrorCode(), kOptStatusBadSetup);
-            EXPECT_EQ(p.fvParams, (std::vector<double>{-2.0, 0.5}));
-        } else {
-            ASSERT_TRUE(status.IsOK()) << status.GetErrorCode();
-            EXPECT_NEAR_REL(p.fvParams[0], kBetaCases[0].fA, kEstimateTol);
-            EXPECT_NEAR_REL(p.fvParams[1], kBetaCases[0].fB, kEstimateTol);
-        }
-    }
+TEST(MCOptimizer, StartOutsideTheBoundsIsMovedInside) {
+    BetaProblem p(kBetaCases[0]);
+    p.fvParams = {-2.0, 0.5};
+    ASSERT_TRUE(p.Run().IsOK());
+    ExpectEstimate(p.fvParams, kBetaCases[0].fA, kBetaCases[0].fB, kEstimateTol);
 }
 
 // A failure reported by the handler (or thrown by it) ends the run with that status and
@@ -378,17 +321,16 @@ TEST_P(OptimizerFailure, HandlerErrorEndsTheRun) {
     EXPECT_TRUE(MCMV::IsMissing(p.fpOptimizer->GetObjective()));
 }
 
-INSTANTIATE_TEST_SUITE_P(Table, OptimizerFailure,
-                         ::testing::Values(FailCase{"NoRecord", kOptStatusNoRecord, false,
-                                                    kOptStatusNoRecord},
-                                           FailCase{"RestartFailed", kOptStatusRestartFailed, false,
-                                                    kOptStatusRestartFailed},
-                                           FailCase{"Cancelled", MCCommon_800::kCancelledCode,
-                                                    false, MCCommon_800::kCancelledCode},
-                                           FailCase{"Throws", 0, true, kOptStatusFailed}),
-                         [](const ::testing::TestParamInfo<FailCase>& p) { return p.param.fName; });
+// clang-format off
+INSTANTIATE_TEST_SUITE_P(Table, OptimizerFailure, ::testing::Values(
+    FailCase{"NoRecord", kOptStatusNoRecord, false, kOptStatusNoRecord},
+    FailCase{"RestartFailed", kOptStatusRestartFailed, false, kOptStatusRestartFailed},
+    FailCase{"Cancelled", MCCommon_800::kCancelledCode, false, MCCommon_800::kCancelledCode},
+    FailCase{"Throws", 0, true, kOptStatusFailed}),
+    [](const ::testing::TestParamInfo<FailCase>& p) { return p.param.fName; });
+// clang-format on
 
-// Unusable set-ups are refused before any evaluation.
+// Unusable set-ups are refused before any evaluation, the parameters left as they were.
 struct SetupCase {
     const char* fName;
     std::vector<double> fvStart;
@@ -404,32 +346,39 @@ TEST_P(OptimizerSetup, IsRefusedWithoutEvaluating) {
     BetaProblem p(kBetaCases[0]);
     p.fvParams = c.fvStart;
     if (!c.fvRow.empty()) {
-        p.fpAccum->AddConstraint(c.fvRow, c.fConstant);
+        p.fpAccum->fvRows.push_back({c.fvRow, c.fConstant});
     }
     EXPECT_EQ(p.Run(c.fSettings).GetErrorCode(), kOptStatusBadSetup);
     EXPECT_TRUE(p.fHandler.fvFlags.empty());
+    EXPECT_TRUE(std::equal(p.fvParams.begin(), p.fvParams.end(), c.fvStart.begin(), c.fvStart.end(),
+                           [](double x, double y) {
+                               return static_cast<bool>(mctest::Near(x, y, 0.0)); // NaN kept
+                           }));
 }
 
-INSTANTIATE_TEST_SUITE_P(
-    Table, OptimizerSetup,
-    ::testing::Values(
-        SetupCase{"ContradictoryBounds", {1.0, 1.0}, {-1.0, 0.0}, -1.0, MCOptimParams()},
-        SetupCase{"RowThatNeverHolds", {1.0, 1.0}, {0.0, 0.0}, -1.0, MCOptimParams()},
-        SetupCase{"RowOfWrongLength", {1.0, 1.0}, {1.0, 1.0, 1.0}, 0.0, MCOptimParams()},
-        SetupCase{"NonFiniteStart", {MCMV::Missing(), 1.0}, {}, 0.0, MCOptimParams()},
-        SetupCase{"NoParameters", {}, {}, 0.0, MCOptimParams()},
-        SetupCase{"NoRule", {1.0, 1.0}, {}, 0.0, WithRule(0)},
-        SetupCase{"NoEvaluations", {1.0, 1.0}, {}, 0.0, WithEvaluations(0)}),
+const MCOptimParams kDefault;
+
+// clang-format off
+INSTANTIATE_TEST_SUITE_P(Table, OptimizerSetup, ::testing::Values(
+    SetupCase{"ContradictoryBounds", {1.0, 1.0}, {-1.0, 0.0}, -1.0, kDefault},
+    SetupCase{"RowThatNeverHolds", {1.0, 1.0}, {0.0, 0.0}, -1.0, kDefault},
+    SetupCase{"RowOfWrongLength", {1.0, 1.0}, {1.0, 1.0, 1.0}, 0.0, kDefault},
+    SetupCase{"NonFiniteStart", {MCMV::Missing(), 1.0}, {}, 0.0, kDefault},
+    SetupCase{"NoParameters", {}, {}, 0.0, kDefault},
+    SetupCase{"StartOutsideWithoutRepair", {-2.0, 0.5}, {}, 0.0,
+              With(&MCOptimParams::fConstraintMode, 1)},
+    SetupCase{"NoRule", {1.0, 1.0}, {}, 0.0, With(&MCOptimParams::fConvergenceRule, 0)},
+    SetupCase{"NoEvaluations", {1.0, 1.0}, {}, 0.0, With(&MCOptimParams::fMaxEvaluations, 0)}),
     [](const ::testing::TestParamInfo<SetupCase>& p) { return p.param.fName; });
+// clang-format on
 
 TEST(MCOptimizer, EvaluationLimitGivesAWarningAndAFeasiblePoint) {
     BetaProblem p(kBetaCases[2]);
     p.fvParams = {0.5, 30.0};
-    const MCStatus status = p.Run(WithEvaluations(3));
+    const MCStatus status = p.Run(With(&MCOptimParams::fMaxEvaluations, 3));
     EXPECT_TRUE(status.IsWarning());
     EXPECT_EQ(status.GetErrorCode(), kOptStatusNoConvergence);
-    EXPECT_GE(p.fvParams[0], 1e-5);
-    EXPECT_GE(p.fvParams[1], 1e-5);
+    EXPECT_TRUE(p.fvParams[0] >= 1e-5 && p.fvParams[1] >= 1e-5);
     EXPECT_TRUE(std::isfinite(p.fpOptimizer->GetObjective()));
 }
 
@@ -467,3 +416,5 @@ TEST(MCOptimizer, ConcurrentRunsGiveTheSerialResults) {
     }
     EXPECT_EQ(concurrent, serial);
 }
+
+} // namespace

@@ -78,15 +78,13 @@ TEST_P(BetaQuantileVsBoost, AgreesAcrossProbabilities) {
     }
 }
 
-INSTANTIATE_TEST_SUITE_P(Shapes, BetaQuantileVsBoost,
-                         ::testing::Values(std::make_pair(0.05, 0.05), std::make_pair(0.1, 3.0),
-                                           std::make_pair(0.5, 0.7), std::make_pair(2.0, 5.0),
-                                           std::make_pair(3.0, 0.2), std::make_pair(50.0, 80.0),
-                                           std::make_pair(1e3, 1e4), std::make_pair(0.01, 100.0),
-                                           std::make_pair(1.0, 3.0), std::make_pair(0.5, 0.5)),
-                         [](const ::testing::TestParamInfo<std::pair<double, double>>& paramInfo) {
-                             return "case" + std::to_string(paramInfo.index);
-                         });
+// clang-format off
+INSTANTIATE_TEST_SUITE_P(Shapes, BetaQuantileVsBoost, ::testing::Values(
+    std::make_pair(0.05, 0.05), std::make_pair(0.1, 3.0), std::make_pair(0.5, 0.7),
+    std::make_pair(2.0, 5.0), std::make_pair(3.0, 0.2), std::make_pair(50.0, 80.0),
+    std::make_pair(1e3, 1e4), std::make_pair(0.01, 100.0), std::make_pair(1.0, 3.0),
+    std::make_pair(0.5, 0.5)));
+// clang-format on
 
 TEST(PreparedQuantiles, AgreeWithHighPrecisionReferences) {
     int checked = 0;
@@ -108,46 +106,32 @@ TEST(PreparedQuantiles, AgreeWithHighPrecisionReferences) {
     EXPECT_GT(checked, 50);
 }
 
-TEST(PreparedQuantiles, InvertTheDistributionFunction) {
-    const MCGammaQuantile gamma(0.4, 2.0);
-    const MCBetaQuantile beta(0.7, 2.5);
-    for (double x = 0.01; x < 1.0; x += 0.0173) {
-        EXPECT_NEAR_REL(gamma(MCDistFun::CdfGam(x, 0.4, 2.0)), x, 1e-11) << x;
-        EXPECT_NEAR_REL(beta(MCDistFun::CdfBeta(x, 0.7, 2.5)), x, 1e-11) << x;
-    }
-}
-
 TEST(PreparedQuantiles, EdgesAndInvalidParameters) {
     const MCGammaQuantile gamma(2.0, 3.0);
     const MCBetaQuantile beta(2.0, 3.0);
     const MCNormalQuantile normal(1.0, 2.0);
-    EXPECT_EQ(gamma(0.0), 0.0);
+    EXPECT_TRUE(gamma(0.0) == 0.0 && beta(0.0) == 0.0 && beta(1.0) == 1.0 && normal(0.5) == 1.0);
     EXPECT_TRUE(MCMV::IsMissing(gamma(1.0)));
-    EXPECT_EQ(beta(0.0), 0.0);
-    EXPECT_EQ(beta(1.0), 1.0);
-    EXPECT_TRUE(MCMV::IsMissing(normal(0.0)));
-    EXPECT_TRUE(MCMV::IsMissing(normal(1.0)));
-    EXPECT_EQ(normal(0.5), 1.0);
+    EXPECT_TRUE(MCMV::IsMissing(normal(0.0)) && MCMV::IsMissing(normal(1.0)));
     for (const double bad : {kNaN, -0.25, 1.5}) {
-        EXPECT_TRUE(MCMV::IsMissing(gamma(bad)));
-        EXPECT_TRUE(MCMV::IsMissing(beta(bad)));
-        EXPECT_TRUE(MCMV::IsMissing(normal(bad)));
+        EXPECT_TRUE(MCMV::IsMissing(gamma(bad)) && MCMV::IsMissing(beta(bad)) &&
+                    MCMV::IsMissing(normal(bad)))
+            << bad;
     }
     // Invalid parameters (and the default objects) give missing for every p.
     const double inf = std::numeric_limits<double>::infinity();
     for (const auto& [first, second] : std::vector<std::pair<double, double>>{
              {0.0, 1.0}, {-1.0, 1.0}, {1.0, 0.0}, {kNaN, 1.0}, {1.0, inf}}) {
-        EXPECT_FALSE(MCGammaQuantile(first, second).IsValid());
-        EXPECT_FALSE(MCBetaQuantile(first, second).IsValid());
+        EXPECT_FALSE(MCGammaQuantile(first, second).IsValid() ||
+                     MCBetaQuantile(first, second).IsValid());
         for (const double p : {0.0, 0.3, 1.0}) {
-            EXPECT_TRUE(MCMV::IsMissing(MCGammaQuantile(first, second)(p)));
-            EXPECT_TRUE(MCMV::IsMissing(MCBetaQuantile(first, second)(p)));
+            EXPECT_TRUE(MCMV::IsMissing(MCGammaQuantile(first, second)(p)) &&
+                        MCMV::IsMissing(MCBetaQuantile(first, second)(p)));
         }
     }
     EXPECT_FALSE(MCNormalQuantile(0.0, 0.0).IsValid());
-    EXPECT_TRUE(MCMV::IsMissing(MCGammaQuantile()(0.5)));
-    EXPECT_TRUE(MCMV::IsMissing(MCBetaQuantile()(0.5)));
-    EXPECT_TRUE(MCMV::IsMissing(MCNormalQuantile()(0.5)));
+    EXPECT_TRUE(MCMV::IsMissing(MCGammaQuantile()(0.5)) && MCMV::IsMissing(MCBetaQuantile()(0.5)) &&
+                MCMV::IsMissing(MCNormalQuantile()(0.5)));
 }
 
 } // namespace

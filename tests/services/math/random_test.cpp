@@ -4,6 +4,8 @@
 #include "mccommon/mcmv.h"
 #include "mctolerance.h"
 
+#include <Eigen/Dense>
+
 #include <gtest/gtest.h>
 
 #include <cmath>
@@ -43,6 +45,14 @@ MCSymMatrix Matrix(int n, const std::vector<double>& lower) {
     return m;
 }
 
+//! A standard normal generator drawing from `stream`.
+MCRandomValues StandardNormal(MCURandom& stream) {
+    MCRandomValues normal;
+    normal.SetURNGPtr(&stream);
+    EXPECT_TRUE(normal.SetParamNormal());
+    return normal;
+}
+
 TEST(MCURandom, IsTheStandardSixtyFourBitMersenneTwister) {
     // The 10000th output of MT19937-64 from the default seed 5489 is fixed by the C++
     // standard ([rand.predef]): the stream is the same engine on every platform.
@@ -65,29 +75,25 @@ TEST(MCURandom, FirstValuesOfTheDefaultSeedArePinned) {
     }
 }
 
+// [0, 1) takes the top 53 bits of a word, (0, 1) the top 52 bits and a final 1: the words 0 and
+// 2^64 - 1 give the ends 0 and 1 - 2^-53, and 2^-53 and 1 - 2^-53.
 TEST(MCURandom, DoublesAreBuiltFromTheTopBitsOfEachWord) {
-    MCURandom halfOpen(12345u);
-    MCURandom open(12345u, true, false);
-    MCURandom words(12345u);
+    std::vector<std::uint64_t> words{0, ~std::uint64_t{0}};
+    MCURandom engine(12345u);
     for (int i = 0; i < 1000; ++i) {
-        const std::uint64_t w = words.GetWord();
+        words.push_back(engine.GetWord());
+    }
+    ListSource a(words);
+    ListSource b(words);
+    MCURandom halfOpen(1u, true, true, &a);
+    MCURandom open(1u, true, false, &b);
+    for (const std::uint64_t w : words) {
         EXPECT_EQ(halfOpen.GetRandom(), static_cast<double>(w >> 11) * kTwoPowMinus53);
         EXPECT_EQ(open.GetRandom(), (2.0 * static_cast<double>(w >> 12) + 1.0) * kTwoPowMinus53);
     }
 }
 
-TEST(MCURandom, EndsOfTheIntervals) {
-    const std::uint64_t allOnes = ~std::uint64_t{0};
-    ListSource source({0, allOnes, 0, allOnes});
-    MCURandom halfOpen(1u, true, true, &source);
-    EXPECT_EQ(halfOpen.GetRandom(), 0.0);
-    EXPECT_EQ(halfOpen.GetRandom(), 1.0 - kTwoPowMinus53);
-    MCURandom open(1u, true, false, &source);
-    EXPECT_EQ(open.GetRandom(), kTwoPowMinus53);
-    EXPECT_EQ(open.GetRandom(), 1.0 - kTwoPowMinus53);
-}
-
-TEST(MCURandom, CopyAndReseedReproduceTheStream) {
+TEST(MCURandom, CopyReseedAndDrawnSeedReproduceTheStream) {
     MCURandom a(777u);
     for (int i = 0; i < 100; ++i) {
         (void)a.GetRandom();
@@ -98,16 +104,11 @@ TEST(MCURandom, CopyAndReseedReproduceTheStream) {
     }
     MCURandom fresh(777u);
     a.SetSeed(777u);
-    for (int i = 0; i < 100; ++i) {
-        ASSERT_EQ(a.GetRandom(), fresh.GetRandom());
-    }
-}
-
-TEST(MCURandom, AnUnseededStreamTellsItsSeed) {
     MCURandom drawn(0u, false);
     MCURandom again(drawn.GetSeed());
-    for (int i = 0; i < 10; ++i) {
-        EXPECT_EQ(drawn.GetRandom(), again.GetRandom());
+    for (int i = 0; i < 100; ++i) {
+        ASSERT_EQ(a.GetRandom(), fresh.GetRandom());
+        ASSERT_EQ(drawn.GetRandom(), again.GetRandom());
     }
 }
 
@@ -119,22 +120,16 @@ TEST(MCRandomValues, NormalFromWordFollowsTheDocumentedMap) {
     const std::uint64_t quarter = std::uint64_t{1} << 62; // k = 2^51: u = 1/4 + 2^-54
     ListSource source({0, top, k52, top | k52, quarter, top | quarter});
     MCURandom stream(1u, true, true, &source);
-    MCRandomValues normal;
-    normal.SetURNGPtr(&stream);
-    ASSERT_TRUE(normal.SetParamNormal());
-    EXPECT_NEAR_REL(normal.GetRandom(), -8.292361075813595, 1e-14);
-    EXPECT_NEAR_REL(normal.GetRandom(), 8.292361075813595, 1e-14);
-    EXPECT_NEAR_REL(normal.GetRandom(), -1.3914582123358836e-16, 1e-12);
-    EXPECT_NEAR_REL(normal.GetRandom(), 1.3914582123358836e-16, 1e-12);
-    EXPECT_NEAR_REL(normal.GetRandom(), -0.6744897501960816, 1e-14);
-    EXPECT_NEAR_REL(normal.GetRandom(), 0.6744897501960816, 1e-14);
+    MCRandomValues normal = StandardNormal(stream);
+    for (const double z : {8.292361075813595, 1.3914582123358836e-16, 0.6744897501960816}) {
+        EXPECT_NEAR_REL(normal.GetRandom(), -z, 1e-12);
+        EXPECT_NEAR_REL(normal.GetRandom(), z, 1e-12);
+    }
 }
 
 TEST(MCRandomValues, FirstNormalsOfTheDefaultSeedArePinned) {
     MCURandom stream;
-    MCRandomValues normal;
-    normal.SetURNGPtr(&stream);
-    ASSERT_TRUE(normal.SetParamNormal());
+    MCRandomValues normal = StandardNormal(stream);
     // The same words mapped by the documented formula with mpmath at 40 digits.
     const double expected[] = {-0.22866486954816465, -1.071291826156457, 1.2288988277205442,
                                -0.8855545299371994, 0.24604021699109757};
@@ -150,9 +145,7 @@ TEST(MCRandomValues, VectorTakesOneWordPerValueThroughTheCholeskyFactor) {
     MCURandom a(99u);
     MCURandom b = a;
     MCURandom c = a;
-    MCRandomValues single;
-    single.SetURNGPtr(&a);
-    ASSERT_TRUE(single.SetParamNormal());
+    MCRandomValues single = StandardNormal(a);
     MCRandomValues pair;
     pair.SetURNGPtr(&b);
     ASSERT_TRUE(pair.SetParamNormal({1.0, -2.0}, 3.0, Matrix(2, {1.0, r, 1.0})));
@@ -177,40 +170,28 @@ TEST(MCRandomValues, SampleCorrelationMatchesTheRequestedMatrix) {
     // 200000 vectors: the standard error of a sample correlation ρ is (1 − ρ²)/√n ≤ 0.0023;
     // the tolerance 0.01 is over four of them (fails for about 1 seed in 10^5), of a mean
     // 5 standard errors, of a standard deviation 1%.
-    const std::vector<double> rho = {1.0, 0.6, 1.0, -0.3, 0.2, 1.0};
-    const MCSymMatrix corr = Matrix(3, rho);
-    const std::vector<double> means = {1.0, -2.0, 5.0};
+    const MCSymMatrix corr = Matrix(3, {1.0, 0.6, 1.0, -0.3, 0.2, 1.0});
+    const Eigen::Vector3d means(1.0, -2.0, 5.0);
     const double scale = 2.0;
     MCURandom stream(629111597u);
     MCRandomValues gen;
     gen.SetURNGPtr(&stream);
-    ASSERT_TRUE(gen.SetParamNormal(means, scale, corr));
+    ASSERT_TRUE(gen.SetParamNormal({means[0], means[1], means[2]}, scale, corr));
     const int n = 200000;
-    std::vector<double> mean(3, 0.0);
-    std::vector<std::vector<double>> co(3, std::vector<double>(3, 0.0));
+    Eigen::MatrixXd sample(n, 3);
     std::vector<double> x;
-    for (int k = 1; k <= n; ++k) {
+    for (int k = 0; k < n; ++k) {
         ASSERT_TRUE(gen.GetRandom(x));
-        std::vector<double> d(3);
-        for (std::size_t i = 0; i < 3; ++i) {
-            d[i] = x[i] - mean[i];
-            mean[i] += d[i] / k;
-        }
-        // West's update of the co-moments: C_ij += (x_i − mean_i,old)(x_j − mean_j,new).
-        for (std::size_t i = 0; i < 3; ++i) {
-            for (std::size_t j = 0; j < 3; ++j) {
-                co[i][j] += d[i] * (x[j] - mean[j]);
-            }
-        }
+        sample.row(k) = Eigen::Vector3d(x[0], x[1], x[2]).transpose();
     }
+    const Eigen::Vector3d mean = sample.colwise().mean();
+    const Eigen::MatrixXd centred = sample.rowwise() - mean.transpose();
+    const Eigen::Matrix3d cov = centred.transpose() * centred / (n - 1);
     for (int i = 0; i < 3; ++i) {
-        const auto ui = static_cast<std::size_t>(i);
-        EXPECT_NEAR(mean[ui], means[ui], 5.0 * scale / std::sqrt(n));
-        EXPECT_NEAR(std::sqrt(co[ui][ui] / (n - 1)), scale, 0.01 * scale);
+        EXPECT_NEAR(mean[i], means[i], 5.0 * scale / std::sqrt(n));
+        EXPECT_NEAR(std::sqrt(cov(i, i)), scale, 0.01 * scale);
         for (int j = 0; j < i; ++j) {
-            const auto uj = static_cast<std::size_t>(j);
-            const double r = co[ui][uj] / std::sqrt(co[ui][ui] * co[uj][uj]);
-            EXPECT_NEAR(r, corr.GetElem(i, j), 0.01) << i << "," << j;
+            EXPECT_NEAR(cov(i, j) / std::sqrt(cov(i, i) * cov(j, j)), corr.GetElem(i, j), 0.01);
         }
     }
 }
@@ -219,8 +200,7 @@ TEST(MCRandomValues, PerfectCorrelationIsUsable) {
     // The copula search asks for the normal pair at r = ±1; the matrix is only
     // semi-definite but the pair is well defined: x1 = ±x0.
     MCURandom stream(3u);
-    MCRandomValues gen;
-    gen.SetURNGPtr(&stream);
+    MCRandomValues gen = StandardNormal(stream);
     std::vector<double> x;
     for (const double r : {1.0, -1.0}) {
         ASSERT_TRUE(gen.SetParamNormal({0.0, 0.0}, 1.0, Matrix(2, {1.0, r, 1.0}))) << r;
@@ -260,20 +240,20 @@ TEST_P(MCRandomValuesBad, IsRefusedAndLeavesNoSetting) {
 
 const double kNaN = std::numeric_limits<double>::quiet_NaN();
 
-INSTANTIATE_TEST_SUITE_P(
-    Settings, MCRandomValuesBad,
-    ::testing::Values(
-        BadSetting{"Indefinite", {0, 0, 0}, 1.0, Matrix(3, {1, 0.9, 1, 0.9, -0.9, 1})},
-        BadSetting{"SizeMismatch", {0, 0}, 1.0, Matrix(3, {1, 0, 1, 0, 0, 1})},
-        BadSetting{"Empty", {}, 1.0, MCSymMatrix()},
-        BadSetting{"NaNEntry", {0, 0}, 1.0, Matrix(2, {1, kNaN, 1})},
-        BadSetting{"NaNMean", {0, kNaN}, 1.0, Matrix(2, {1, 0.5, 1})},
-        BadSetting{"ZeroScale", {0, 0}, 0.0, Matrix(2, {1, 0.5, 1})},
-        BadSetting{"NegativeScale", {0, 0}, -1.0, Matrix(2, {1, 0.5, 1})},
-        BadSetting{"NaNScale", {0, 0}, kNaN, Matrix(2, {1, 0.5, 1})},
-        BadSetting{"CorrelationAboveOne", {0, 0}, 1.0, Matrix(2, {1, 1.01, 1})},
-        BadSetting{"NegativeVariance", {0, 0}, 1.0, Matrix(2, {-1, 0, 1})}),
-    [](const ::testing::TestParamInfo<BadSetting>& paramInfo) { return paramInfo.param.fName; });
+// clang-format off
+INSTANTIATE_TEST_SUITE_P(Settings, MCRandomValuesBad, ::testing::Values(
+    BadSetting{"Indefinite", {0, 0, 0}, 1.0, Matrix(3, {1, 0.9, 1, 0.9, -0.9, 1})},
+    BadSetting{"SizeMismatch", {0, 0}, 1.0, Matrix(3, {1, 0, 1, 0, 0, 1})},
+    BadSetting{"Empty", {}, 1.0, MCSymMatrix()},
+    BadSetting{"NaNEntry", {0, 0}, 1.0, Matrix(2, {1, kNaN, 1})},
+    BadSetting{"NaNMean", {0, kNaN}, 1.0, Matrix(2, {1, 0.5, 1})},
+    BadSetting{"ZeroScale", {0, 0}, 0.0, Matrix(2, {1, 0.5, 1})},
+    BadSetting{"NegativeScale", {0, 0}, -1.0, Matrix(2, {1, 0.5, 1})},
+    BadSetting{"NaNScale", {0, 0}, kNaN, Matrix(2, {1, 0.5, 1})},
+    BadSetting{"CorrelationAboveOne", {0, 0}, 1.0, Matrix(2, {1, 1.01, 1})},
+    BadSetting{"NegativeVariance", {0, 0}, 1.0, Matrix(2, {-1, 0, 1})}),
+    [](const ::testing::TestParamInfo<BadSetting>& p) { return p.param.fName; });
+// clang-format on
 
 TEST(MCRandomValues, DrawingNeedsAStreamAndAMatchingSetting) {
     MCRandomValues gen;

@@ -16,36 +16,43 @@ namespace {
 using namespace MCXML_800;
 using xercesc::DOMElement;
 
+using Names = std::vector<std::string>;
+
 // Names of the child elements of `parent` in order, walked with the any-name lookups.
-std::vector<std::string> ChildNames(const xercesc::DOMNode* parent) {
-    std::vector<std::string> names;
+Names ChildNames(const xercesc::DOMNode* parent) {
+    Names names;
     for (const DOMElement* e = GetFirstChildElmt(parent); e != nullptr; e = GetNextSiblingElmt(e)) {
         names.push_back(ToUTF8(e->getTagName()));
     }
     return names;
 }
 
-std::string RoundTripText(const xercesc::DOMDocument* doc) {
+std::string Serialized(const xercesc::DOMDocument* doc) {
     std::string text;
     EXPECT_TRUE(SerializeToUTF8(doc, text));
     return text;
 }
 
+// The root element of `doc` after writing it and reading it back with `reader`.
+const DOMElement* Reparsed(const xercesc::DOMDocument* doc, MCXMLReadWrite& reader) {
+    EXPECT_TRUE(reader.ParseToDOM(Serialized(doc))) << reader.GetErrorMessage();
+    return reader.GetDocument() ? reader.GetDocument()->getDocumentElement() : nullptr;
+}
+
 class XmlTree : public ::testing::Test {
 protected:
-    // Root holding A(id 1), B, A(id 2), a text node, a comment, C.
+    // Root holding A(id 1), B, A(id 3), a text node, a comment, C.
     void SetUp() override {
         ASSERT_NE(fpDoc, nullptr);
-        DOMElement* root = fpDoc->getDocumentElement();
         int id = 0;
         for (const char* name : {"A", "B", "A"}) {
             DOMElement* e = CreateElement(fpDoc.get(), name);
             ASSERT_TRUE(SetAttribute(e, "id", ++id));
-            ASSERT_TRUE(InsertElement(root, e));
+            ASSERT_TRUE(InsertElement(Root(), e));
         }
-        root->appendChild(fpDoc->createTextNode(u"text between"));
-        root->appendChild(fpDoc->createComment(u"a comment"));
-        ASSERT_TRUE(InsertElement(root, CreateElement(fpDoc.get(), "C")));
+        Root()->appendChild(fpDoc->createTextNode(u"text between"));
+        Root()->appendChild(fpDoc->createComment(u"a comment"));
+        ASSERT_TRUE(InsertElement(Root(), CreateElement(fpDoc.get(), "C")));
     }
     DOMElement* Root() const { return fpDoc->getDocumentElement(); }
 
@@ -53,45 +60,35 @@ protected:
 };
 
 TEST_F(XmlTree, FindsElementsByNameAndByAnyName) {
-    EXPECT_EQ(ChildNames(Root()), (std::vector<std::string>{"A", "B", "A", "C"}));
-
-    const DOMElement* a1 = GetFirstChildElmt(Root(), "A");
-    ASSERT_NE(a1, nullptr);
-    const DOMElement* a2 = GetNextSiblingElmt(a1, "A");
+    EXPECT_EQ(ChildNames(Root()), (Names{"A", "B", "A", "C"}));
+    const DOMElement* a2 = GetNextSiblingElmt(GetFirstChildElmt(Root(), "A"), "A");
     ASSERT_NE(a2, nullptr);
     int id = 0;
     EXPECT_EQ(GetIntAttribute(a2, "id", 0, id), kAttributeRead);
     EXPECT_EQ(id, 3);
     EXPECT_EQ(GetNextSiblingElmt(a2, "A"), nullptr);
-    // Text and comment nodes between B's next A and C are skipped.
+    // The text and comment nodes between the second A and C are skipped.
     EXPECT_EQ(GetNextSiblingElmt(a2), GetFirstChildElmt(Root(), "C"));
-
-    EXPECT_EQ(GetFirstChildElmt(Root(), "Z"), nullptr);
     EXPECT_EQ(GetFirstChildElmt(Root(), "a"), nullptr); // names are case-sensitive
     EXPECT_EQ(GetFirstChildElmt(Root(), std::string("A\0B", 3)), nullptr);
     EXPECT_EQ(GetFirstChildElmt(GetFirstChildElmt(Root(), "C")), nullptr);
     EXPECT_EQ(GetFirstChildElmt(nullptr, "A"), nullptr);
     EXPECT_EQ(GetNextSiblingElmt(nullptr), nullptr);
     EXPECT_EQ(GetNextSiblingElmt(Root()), nullptr);
-    // The document node's first child element is the root.
     EXPECT_EQ(GetFirstChildElmt(fpDoc.get(), "Root"), Root());
 }
 
-TEST_F(XmlTree, InsertsBeforeAGivenChildOrAppends) {
+TEST_F(XmlTree, InsertsBeforeAGivenChildAndRefusalsLeaveTheTree) {
     DOMElement* b = GetFirstChildElmt(Root(), "B");
     ASSERT_TRUE(InsertElement(Root(), CreateElement(fpDoc.get(), "N"), b));
-    EXPECT_EQ(ChildNames(Root()), (std::vector<std::string>{"A", "N", "B", "A", "C"}));
-
-    // Refusals leave the tree as it was.
     DOMElement* loose = CreateElement(fpDoc.get(), "L");
-    DOMElement* notAChild = CreateElement(fpDoc.get(), "X");
-    EXPECT_FALSE(InsertElement(Root(), loose, notAChild));
+    EXPECT_FALSE(InsertElement(Root(), loose, CreateElement(fpDoc.get(), "X"))); // not a child
     DOMDocumentPtr other = CreateDocument("", "Other");
     EXPECT_FALSE(InsertElement(Root(), CreateElement(other.get(), "Foreign")));
     EXPECT_FALSE(InsertElement(b, Root())); // an element into its own descendant
     EXPECT_FALSE(InsertElement(nullptr, loose));
     EXPECT_FALSE(InsertElement(Root(), nullptr));
-    EXPECT_EQ(ChildNames(Root()), (std::vector<std::string>{"A", "N", "B", "A", "C"}));
+    EXPECT_EQ(ChildNames(Root()), (Names{"A", "N", "B", "A", "C"}));
 }
 
 TEST(XmlElement, InvalidNamesGiveNoElement) {
@@ -110,49 +107,41 @@ TEST(XmlElement, InvalidNamesGiveNoElement) {
 TEST(XmlNamespace, ChildrenKeepTheRootNamespace) {
     const std::string space = "http://example.org/mcsim/test";
     DOMDocumentPtr doc = CreateDocument(space, "Plan");
-    ASSERT_NE(doc, nullptr);
     DOMElement* child = CreateElement(doc.get(), "Section");
     ASSERT_TRUE(InsertElement(doc->getDocumentElement(), child));
     ASSERT_TRUE(InsertElement(child, CreateElement(doc.get(), "Item")));
-    const std::string text = RoundTripText(doc.get());
-    EXPECT_EQ(text.find("xmlns=\"\""), std::string::npos) << text;
-
+    EXPECT_EQ(Serialized(doc.get()).find("xmlns=\"\""), std::string::npos);
     MCXMLReadWrite reader;
-    ASSERT_TRUE(reader.ParseToDOM(text)) << reader.GetErrorMessage();
-    const DOMElement* item = GetFirstChildElmt(
-        GetFirstChildElmt(reader.GetDocument()->getDocumentElement(), "Section"), "Item");
+    const DOMElement* item =
+        GetFirstChildElmt(GetFirstChildElmt(Reparsed(doc.get(), reader), "Section"), "Item");
     ASSERT_NE(item, nullptr);
     EXPECT_EQ(ToUTF8(item->getNamespaceURI()), space);
 }
 
-// A root made without a namespace that declares one through ordinary xmlns attributes: the
-// declarations are written as set and the children land in the declared namespace on reading.
+// A root without a namespace that declares one through xmlns attributes: the declarations are
+// written as set and the children land in the declared namespace on reading.
 TEST(XmlNamespace, DeclaredThroughAttributesOnARootWithoutNamespace) {
     const std::string space = "http://example.org/mcsim/plan";
     DOMDocumentPtr doc = CreateDocument("", "Plan");
     DOMElement* root = doc->getDocumentElement();
     ASSERT_TRUE(SetAttribute(root, "xmlns", space));
     ASSERT_TRUE(SetAttribute(root, "xmlns:xsi", "http://www.w3.org/2001/XMLSchema-instance"));
-    ASSERT_TRUE(SetAttribute(root, "xsi:schemaLocation", space + " " + space + "/plan.xsd"));
+    ASSERT_TRUE(SetAttribute(root, "xsi:schemaLocation", space + " plan.xsd"));
     ASSERT_TRUE(InsertElement(root, CreateElement(doc.get(), "Header")));
-
     MCXMLReadWrite reader;
-    ASSERT_TRUE(reader.ParseToDOM(RoundTripText(doc.get()))) << reader.GetErrorMessage();
-    const DOMElement* readRoot = reader.GetDocument()->getDocumentElement();
+    const DOMElement* readRoot = Reparsed(doc.get(), reader);
     const DOMElement* header = GetFirstChildElmt(readRoot, "Header");
     ASSERT_NE(header, nullptr);
     EXPECT_EQ(ToUTF8(header->getNamespaceURI()), space);
     std::string location;
     ASSERT_TRUE(GetAttribute(readRoot, "xsi:schemaLocation", location));
-    EXPECT_EQ(location, space + " " + space + "/plan.xsd");
-}
+    EXPECT_EQ(location, space + " plan.xsd");
 
-TEST(XmlNamespace, PrefixedElementsAreFoundByLocalName) {
-    MCXMLReadWrite reader;
+    // Prefixed elements are found by their local name too.
     ASSERT_TRUE(reader.ParseToDOM("<p:Plan xmlns:p='urn:p'><x/><p:Target name='t'/></p:Plan>"));
-    const DOMElement* root = reader.GetDocument()->getDocumentElement();
-    EXPECT_EQ(GetFirstChildElmt(root, "Target"), GetFirstChildElmt(root, "p:Target"));
-    EXPECT_NE(GetFirstChildElmt(root, "Target"), nullptr);
+    const DOMElement* prefixed = reader.GetDocument()->getDocumentElement();
+    EXPECT_NE(GetFirstChildElmt(prefixed, "Target"), nullptr);
+    EXPECT_EQ(GetFirstChildElmt(prefixed, "Target"), GetFirstChildElmt(prefixed, "p:Target"));
 }
 
 // Pretty-print off: no indentation or line break is added between elements.
@@ -161,12 +150,11 @@ TEST(XmlSerializer, WritesUTF8WithoutAddedLayout) {
     DOMElement* a = CreateElement(doc.get(), "A");
     ASSERT_TRUE(InsertElement(doc->getDocumentElement(), a));
     ASSERT_TRUE(InsertElement(a, CreateElement(doc.get(), "B")));
-    const std::string text = RoundTripText(doc.get());
+    const std::string text = Serialized(doc.get());
     EXPECT_EQ(text.rfind("<?xml", 0), 0u) << text;
     EXPECT_NE(text.find("encoding=\"UTF-8\""), std::string::npos) << text;
     EXPECT_NE(text.find("<R><A><B/></A></R>"), std::string::npos) << text;
     EXPECT_EQ(text.find('\n'), std::string::npos) << text;
-
     std::string untouched = "keep";
     EXPECT_FALSE(SerializeToUTF8(nullptr, untouched));
     EXPECT_EQ(untouched, "keep");
@@ -182,15 +170,10 @@ TEST(XmlText, NonAsciiNamesAndValuesRoundTrip) {
     ASSERT_TRUE(SetAttribute(e, attributeName, value));
     e->appendChild(doc->createTextNode(ToUTF16(value).c_str()));
     ASSERT_TRUE(InsertElement(doc->getDocumentElement(), e));
-
-    const std::string text = RoundTripText(doc.get());
     // The writer emits the characters as UTF-8, not as character references.
-    EXPECT_NE(text.find(value), std::string::npos) << text;
-
+    EXPECT_NE(Serialized(doc.get()).find(value), std::string::npos);
     MCXMLReadWrite reader;
-    ASSERT_TRUE(reader.ParseToDOM(text)) << reader.GetErrorMessage();
-    const DOMElement* back =
-        GetFirstChildElmt(reader.GetDocument()->getDocumentElement(), elementName);
+    const DOMElement* back = GetFirstChildElmt(Reparsed(doc.get(), reader), elementName);
     ASSERT_NE(back, nullptr);
     std::string backValue;
     ASSERT_TRUE(GetAttribute(back, attributeName, backValue));
@@ -199,34 +182,28 @@ TEST(XmlText, NonAsciiNamesAndValuesRoundTrip) {
 }
 
 TEST(XmlText, ConversionsOfKnownAndMalformedText) {
-    const XMLCh kReplacement = 0xFFFD;
-    const struct {
-        std::string utf8;
-        UTF16String utf16;
-    } kPairs[] = {
+    const XMLCh kBad = 0xFFFD; // each bad unit becomes U+FFFD and the text after it is kept
+    const std::pair<std::string, UTF16String> kPairs[] = {
         {"", u""},
         {"plain", u"plain"},
         {"\xE2\x82\xAC", {0x20AC}},             // EURO SIGN, three bytes
         {"\xF0\x9F\x98\x80", {0xD83D, 0xDE00}}, // U+1F600, a surrogate pair
         {"\xC3\xA9t\xC3\xA9", {0x00E9, u't', 0x00E9}},
     };
-    for (const auto& p : kPairs) {
-        EXPECT_EQ(ToUTF16(p.utf8), p.utf16) << p.utf8;
-        EXPECT_EQ(ToUTF8(p.utf16), p.utf8) << p.utf8;
-        EXPECT_EQ(ToUTF8(p.utf16.c_str()), p.utf8) << p.utf8;
+    for (const auto& [utf8, utf16] : kPairs) {
+        EXPECT_EQ(ToUTF16(utf8), utf16) << utf8;
+        EXPECT_EQ(ToUTF8(utf16), utf8) << utf8;
+        EXPECT_EQ(ToUTF8(utf16.c_str()), utf8) << utf8;
     }
     EXPECT_EQ(ToUTF8(static_cast<const XMLCh*>(nullptr)), "");
     EXPECT_EQ(ToUTF16(static_cast<const char*>(nullptr)), UTF16String());
-
-    // Ill-formed input: each bad unit becomes U+FFFD and the text after it is kept.
-    EXPECT_EQ(ToUTF16(std::string("a\xC3")), (UTF16String{u'a', kReplacement}));
-    EXPECT_EQ(ToUTF16(std::string("\xC3(x")), (UTF16String{kReplacement, u'(', u'x'}));
-    EXPECT_EQ(ToUTF16(std::string("\xFF\xFE")), (UTF16String{kReplacement, kReplacement}));
+    EXPECT_EQ(ToUTF16(std::string("a\xC3")), (UTF16String{u'a', kBad}));
+    EXPECT_EQ(ToUTF16(std::string("\xC3(x")), (UTF16String{kBad, u'(', u'x'}));
+    EXPECT_EQ(ToUTF16(std::string("\xFF\xFE")), (UTF16String{kBad, kBad}));
     // An overlong form of '/' and a surrogate encoded in UTF-8 are not valid UTF-8.
     EXPECT_EQ(ToUTF16(std::string("\xC0\xAF")).find(u'/'), UTF16String::npos);
-    EXPECT_EQ(ToUTF16(std::string("\xED\xA0\x80")).front(), kReplacement);
-    const UTF16String lone = {u'x', 0xD800, u'y'};
-    EXPECT_EQ(ToUTF8(lone), "x\xEF\xBF\xBDy");
+    EXPECT_EQ(ToUTF16(std::string("\xED\xA0\x80")).front(), kBad);
+    EXPECT_EQ(ToUTF8(UTF16String{u'x', 0xD800, u'y'}), "x\xEF\xBF\xBDy");
 }
 
 } // namespace
