@@ -1,5 +1,5 @@
-// The plan file writer, the serialisation step and the handler's construction. The reader is
-// in mcplanxmlreader.cpp.
+// The plan file writer, the fitting statistics writer, the serialisation step and the
+// handler's construction. The reader is in mcplanxmlreader.cpp.
 #include "simulation_common/mcplanxmlhandler.h"
 
 #include "mccommon/mcmv.h"
@@ -716,6 +716,205 @@ bool MCPlanXMLHandler::SetDoubleAttribute(DOMElement* element, const std::string
         return MCXML_800::SetAttribute(element, name, std::string("."));
     }
     return MCXML_800::SetAttribute(element, name, value);
+}
+
+// ---------------------------------------------------------------------------------------------
+// The fitting statistics document
+
+namespace {
+
+//! Parameter `i` of a fitted distribution, missing when the list is shorter.
+double ParamAt(const std::vector<double>& params, std::size_t i) {
+    return i < params.size() ? params[i] : MCMV::Missing();
+}
+
+//! One `Category` per position below `count`: `value` = the category text, one `Probability`
+//! child holding its probability.
+void AddFittedCategories(DOMElement* parent, const std::vector<std::string>& cats,
+                         const std::vector<double>& probs, std::size_t count) {
+    for (std::size_t i = 0; i < count; ++i) {
+        DOMElement* category = NewElement(parent, "Category");
+        Put(category, "value", i < cats.size() ? cats[i] : std::string());
+        DOMElement* probability = NewElement(parent, "Probability");
+        Put(probability, "value", ParamAt(probs, i));
+        Append(category, probability);
+        Append(parent, category);
+    }
+}
+
+} // namespace
+
+bool MCPlanXMLHandler::WriteFittingOutStats(std::string& out, const DFCOutputStats* results) {
+    // The one catch site of this writer, as for the plan file.
+    try {
+        if (results == nullptr) {
+            return false;
+        }
+        MCXML_800::DOMDocumentPtr doc = MCXML_800::CreateDocument("", "FitStats");
+        if (!doc) {
+            return false;
+        }
+        DOMElement* root = doc->getDocumentElement();
+        const bool exportCrosstabs = results->GetSettings().GetExportCrosstabs();
+
+        DOMElement* simulatedFields = NewElement(root, "SimulatedFields");
+        if (!AddStatsInforEle(simulatedFields, results->GetCovarDistInfo(),
+                              results->GetFactorDistInfo(), results->GetGFType(),
+                              exportCrosstabs)) {
+            return false;
+        }
+        bool result = InsertElement(root, simulatedFields);
+
+        // A matrix that cannot be listed gives no cells, and then no CorrMatrix.
+        std::vector<SPCSettings::CorrMatrixCell> cells;
+        static_cast<void>(SPCSettings::GetCorrMatrixCellCollectionFrom(cells, results));
+        if (!cells.empty()) {
+            DOMElement* corrMatrix = NewElement(root, "CorrMatrix");
+            if (!AddCorrMetrixElement(corrMatrix, cells, false)) {
+                return false;
+            }
+            result = InsertElement(root, corrMatrix) && result;
+        }
+
+        if (exportCrosstabs) {
+            std::vector<std::string> factors;
+            for (const DFCOutputStats::DFCVarDistInfo& record : results->GetFactorDistInfo()) {
+                factors.push_back(record.fFittedVarName);
+            }
+            if (!factors.empty()) {
+                DOMElement* table = NewElement(root, "ContingencyTable");
+                if (!AddCrossTabMetrixElement(table, factors, results->GetCrstabsMatrix(),
+                                              results->GetCrstabsProbs())) {
+                    return false;
+                }
+                result = InsertElement(root, table) && result;
+            }
+        }
+
+        return result && WriteFromDOM(out, doc.get());
+    } catch (...) {
+        return false;
+    }
+}
+
+// A factor, or a covariate that is not continuous, is tested by chi-square; a continuous
+// covariate by the chosen EDF test first and, unless only that one is wanted, the other.
+bool MCPlanXMLHandler::AddStatsInforEle(
+    DOMElement* simulatedFields, const std::vector<DFCOutputStats::DFCVarDistInfo>& covariates,
+    const std::vector<DFCOutputStats::DFCVarDistInfo>& factors, GoodFitType gfType,
+    bool exportCrosstabs) {
+    const std::size_t nCovariates = covariates.size();
+    bool result = true;
+    for (std::size_t i = 0; i < nCovariates + factors.size() && result; ++i) {
+        const bool isFactor = i >= nCovariates;
+        const DFCOutputStats::DFCVarDistInfo& record =
+            isFactor ? factors[i - nCovariates] : covariates[i];
+        if (record.fDistBestType == kDistUnknown) {
+            continue;
+        }
+        DOMElement* field = NewElement(simulatedFields, "SimulatedField");
+        Put(field, "name", record.fFittedVarName);
+
+        if (record.fDistBestType == kDistCategorical) {
+            DOMElement* categorical = NewElement(field, "Categorical");
+            AddFittedCategories(categorical, record.fDistBestParamNames, record.fDistBestParams,
+                                record.fDistBestParamNames.size());
+            if (!AddFitElement(categorical, "ChiSquare", record.fBestFitStat,
+                               record.fBestFitPValue)) {
+                return false;
+            }
+            Append(field, categorical);
+        }
+
+        const bool chiSquare = isFactor || record.fMeasureLevel != kLevelContinuous;
+        for (const DFCOutputStats::DFCVarDistElement& element : record.fReportedElements) {
+            if (!element.fbDistAllowed) {
+                continue;
+            }
+            DOMElement* dist = NewElement(field, DistType2String(element.fDistType));
+            AddFittedDistParams(dist, element, exportCrosstabs);
+            bool fitsAdded = false;
+            if (chiSquare) {
+                fitsAdded = AddFitElement(dist, "ChiSquare", element.fChiSquareFit,
+                                          element.fChiSquarePValue);
+            } else if (gfType == kAndersonDarling) {
+                fitsAdded = AddADFitStats(dist, element) &&
+                            (fSelectedFitOnly || AddKSFitStats(dist, element));
+            } else {
+                fitsAdded = AddKSFitStats(dist, element) &&
+                            (fSelectedFitOnly || AddADFitStats(dist, element));
+            }
+            if (!fitsAdded) {
+                return false;
+            }
+            Append(field, dist);
+        }
+        result = InsertElement(simulatedFields, field);
+    }
+    return result;
+}
+
+bool MCPlanXMLHandler::AddADFitStats(DOMElement*& distElement,
+                                     const DFCOutputStats::DFCVarDistElement& element) {
+    return AddFitElement(distElement, "AnderDarling", element.fADFit, element.fADPValue);
+}
+
+bool MCPlanXMLHandler::AddKSFitStats(DOMElement*& distElement,
+                                     const DFCOutputStats::DFCVarDistElement& element) {
+    return AddFitElement(distElement, "KolmogSmirn", element.fKSFit, element.fKSPValue);
+}
+
+bool MCPlanXMLHandler::AddFitElement(DOMElement* parent, const std::string& fitName,
+                                     double fitValue, double pValue) {
+    DOMElement* fit = NewElement(parent, "Fit");
+    Put(fit, "fitName", fitName);
+    if (!SetDoubleAttribute(fit, "fitValue", fitValue) || !SetDoubleAttribute(fit, "p", pValue)) {
+        throw PlanWriteError("fit statistics not set");
+    }
+    return InsertElement(parent, fit);
+}
+
+// Categorical: the candidate's categories with their probabilities. Empirical: its bounds,
+// standard deviation and bin proportions when the contingency table is exported, otherwise
+// only its bounds. Every other type: one Parameters child with an attribute per parameter.
+void MCPlanXMLHandler::AddFittedDistParams(DOMElement* distElement,
+                                           const DFCOutputStats::DFCVarDistElement& element,
+                                           bool exportCrosstabs) {
+    const std::vector<double>& params = element.fDistParams;
+    const std::vector<std::string>& names = element.fDistParamNames;
+    switch (element.fDistType) {
+    case kDistCategorical:
+        AddFittedCategories(distElement, names, params, params.size());
+        break;
+    case kDistEmpirical:
+        if (exportCrosstabs) {
+            if (!SetDoubleAttribute(distElement, "min", ParamAt(params, 0)) ||
+                !SetDoubleAttribute(distElement, "max", ParamAt(params, 1)) ||
+                !SetDoubleAttribute(distElement, "stddev", ParamAt(params, 2))) {
+                throw PlanWriteError("Empirical bounds not set");
+            }
+            PutCount(distElement, "nbins", params.size() > 3 ? params.size() - 3 : 0);
+            for (std::size_t i = 3; i < params.size(); ++i) {
+                DOMElement* probability = NewElement(distElement, "Probability");
+                if (!SetDoubleAttribute(probability, "value", params[i])) {
+                    throw PlanWriteError("attribute value not set");
+                }
+                Append(distElement, probability);
+            }
+        } else {
+            Put(distElement, names.size() > 0 ? names[0] : std::string("min"), ParamAt(params, 0));
+            Put(distElement, names.size() > 1 ? names[1] : std::string("max"), ParamAt(params, 1));
+        }
+        break;
+    default: {
+        DOMElement* parameters = NewElement(distElement, "Parameters");
+        for (std::size_t i = 0; i < names.size(); ++i) {
+            Put(parameters, names[i], ParamAt(params, i));
+        }
+        Append(distElement, parameters);
+        break;
+    }
+    }
 }
 
 // ---------------------------------------------------------------------------------------------

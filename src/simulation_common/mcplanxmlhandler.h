@@ -1,5 +1,6 @@
 // The plan file: a simulation plan (SPCSettings) written as an XML document with root
-// `SimulationPlan`, and such a document read back into a plan.
+// `SimulationPlan`, and such a document read back into a plan; and the fitting statistics
+// document (root `FitStats`) written from the results of a distribution-fitting run.
 //
 // The host asks MCPlanXMLHandler to write a plan into a string (WritePlanFile) and later hands
 // the text, a stream or a parsed document back to be read (ParsePlanFile). When the handler was
@@ -12,7 +13,7 @@
 // The writer's builders raise an internal error for an element or attribute that cannot be
 // made (a text holding a character XML cannot carry), which the entry point turns into false:
 // such a document would lack the item and could not be read back. The fitting statistics
-// writer belongs in mcplanxmlhandler.cpp, beside the element and attribute helpers it shares.
+// writer is in mcplanxmlhandler.cpp, beside the element and attribute helpers it shares.
 //
 // Nothing leaves these operations as an exception: every entry point catches what the XML
 // library or the allocator throws and reports false. A false read leaves whatever was added to
@@ -67,6 +68,13 @@ public:
     //! Writes the plan file of `plan` into `out`; true on success. On failure `out` keeps its
     //! content unless the final serialisation step was reached.
     bool WritePlanFile(std::string& out, const SPCSettings* plan);
+    //! Writes the fitting statistics document of `results` into `out`: per fitted field its
+    //! allowed candidates with parameters and test statistics, then the covariates'
+    //! correlations and, when the fitting settings export it, the factors' contingency table.
+    //! For a continuous field only the statistic of the chosen test is written when the
+    //! handler was made with `selectedFitOnly`, else both. True on success; on failure `out`
+    //! keeps its content unless the final serialisation step was reached.
+    bool WriteFittingOutStats(std::string& out, const DFCOutputStats* results);
 
     // ---- Reading ---------------------------------------------------------------------------
 
@@ -130,6 +138,27 @@ private:
     //! Sets `name` to "." for the missing value, else to the number; true when it was set.
     static bool SetDoubleAttribute(xercesc::DOMElement* element, const std::string& name,
                                    double value);
+
+    // ---- Fitting statistics builders ---------------------------------------------------------
+
+    //! One `SimulatedField` per record with a best distribution, covariate records first.
+    bool AddStatsInforEle(xercesc::DOMElement* simulatedFields,
+                          const std::vector<DFCOutputStats::DFCVarDistInfo>& covariates,
+                          const std::vector<DFCOutputStats::DFCVarDistInfo>& factors,
+                          MCSPConst::GoodFitType gfType, bool exportCrosstabs);
+    //! Appends an "AnderDarling" `Fit` to `distElement`; the result of the append.
+    bool AddADFitStats(xercesc::DOMElement*& distElement,
+                       const DFCOutputStats::DFCVarDistElement& element);
+    //! Appends a "KolmogSmirn" `Fit` to `distElement`; the result of the append.
+    bool AddKSFitStats(xercesc::DOMElement*& distElement,
+                       const DFCOutputStats::DFCVarDistElement& element);
+    //! Appends a `Fit` named `fitName` with its statistic and p-value; the result of the append.
+    static bool AddFitElement(xercesc::DOMElement* parent, const std::string& fitName,
+                              double fitValue, double pValue);
+    //! The parameters of one candidate inside its distribution element, by type.
+    static void AddFittedDistParams(xercesc::DOMElement* distElement,
+                                    const DFCOutputStats::DFCVarDistElement& element,
+                                    bool exportCrosstabs);
 
     // ---- Plan file readers: false ends the read --------------------------------------------
 

@@ -516,6 +516,71 @@ void SimInputSpecs::GetFinalCategories(std::vector<std::string>& cats) const {
     fvDistributions[0].GetParameterNameValue(0, name, cats);
 }
 
+// Categories are matched by exact text. The host's numeric categories are taken in the
+// default stream form (six significant digits), which is how the plan keeps numeric
+// categories, so a plan category "1" matches a host category 1.0. For each distribution the
+// probability of a matched category moves to the host's position and a host category the
+// plan lacked gets 0. When plan categories are missing from the data, the probabilities that
+// remain are divided by their sum S so that they again sum to 1; nothing is rescaled when
+// S = 0 (no category matched) or S >= 1. The unmatched list and the all-invalid flag describe
+// the first distribution, whose categories every other distribution shares.
+void SimInputSpecs::AdjustCategories(const IMCVariable* var) {
+    if (var == nullptr || fvDistributions.empty() ||
+        fvDistributions[0].GetDistType() != kDistCategorical) {
+        return;
+    }
+    const MCXML_800::MCCatNumEncoder* view = var->GetCategorical();
+    const int kind = var->GetMeasure();
+    if (view == nullptr || IsString() != (var->GetStorage() == IMCVariable::kStringStorage) ||
+        (kind != IMCVariable::kNominalKind && kind != IMCVariable::kOrderedKind)) {
+        return;
+    }
+    std::vector<std::string> hostCats;
+    for (int k = 0; k < view->GetNCategories(); ++k) {
+        hostCats.push_back(view->GetCategoryText(k));
+    }
+
+    fvUnmatchedCategories.clear();
+    for (std::size_t d = 0; d < fvDistributions.size(); ++d) {
+        DistInfoElem& dist = fvDistributions[d];
+        std::string catsName = "cats";
+        std::string probsName = "probs";
+        std::vector<std::string> planCats;
+        std::vector<double> planProbs;
+        dist.GetParameterNameValue(0, catsName, planCats);
+        dist.GetParameterNameValue(1, probsName, planProbs);
+
+        std::vector<double> probs(hostCats.size(), 0.0);
+        double sum = 0.0;
+        for (std::size_t i = 0; i < planCats.size(); ++i) {
+            const auto it = std::find(hostCats.begin(), hostCats.end(), planCats[i]);
+            const double p = i < planProbs.size() ? planProbs[i] : 0.0;
+            if (it != hostCats.end()) {
+                // Adding rather than storing keeps the sum right should the plan list a
+                // category twice.
+                probs[static_cast<std::size_t>(it - hostCats.begin())] += p;
+                sum += p;
+            } else if (d == 0) {
+                fvUnmatchedCategories.push_back(planCats[i]);
+            }
+        }
+        fbAllCategoriesInvalid = planCats.size() == fvUnmatchedCategories.size();
+        if (fvUnmatchedCategories.empty() && planCats.size() == hostCats.size()) {
+            continue;
+        }
+        if (!fvUnmatchedCategories.empty() && sum > 0.0 && sum < 1.0) {
+            for (double& p : probs) {
+                p /= sum;
+            }
+        }
+        DistInfoElem adjusted;
+        adjusted.SetDistType(kDistCategorical);
+        static_cast<void>(adjusted.AddParameter(catsName, hostCats));
+        static_cast<void>(adjusted.AddParameter(probsName, probs));
+        dist = std::move(adjusted);
+    }
+}
+
 bool SimInputSpecs::SetDefaultAutofit(MeasureLevel level) {
     bool raised = false;
     for (int t = kDistBinomial; t < kNFittedTypes; ++t) {

@@ -218,6 +218,13 @@ public:
     //! When the first distribution is a Categorical, replaces `cats` by its categories;
     //! otherwise leaves `cats` untouched.
     void GetFinalCategories(std::vector<std::string>& cats) const;
+    //! Aligns the Categorical distributions with the categories of the host's variable `var`:
+    //! afterwards they list the host's categories in the host's order, a host category the
+    //! plan lacked has probability 0, and a plan category the data lacks is dropped and listed
+    //! in GetUnmatchedCagegories (the rest rescaled to sum to 1). Does nothing unless the first
+    //! distribution is a Categorical and `var` is a categorical variable of the same storage
+    //! kind (text or number).
+    void AdjustCategories(const MCXML_800::IMCVariable* var);
 
     // Autofit candidates: one flag per distribution type.
 

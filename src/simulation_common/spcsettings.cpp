@@ -1,12 +1,15 @@
 #include "simulation_common/spcsettings.h"
 
+#include "component/mcspassert.h"
 #include "mccommon/display.h"
+#include "mccommon/mcmv.h"
 
 #include <algorithm>
 
 namespace MCMCSP_800 {
 
 using namespace MCSPConst;
+using MCCommon_800::MCMV;
 using MCXML_800::MCVarList;
 
 namespace {
@@ -342,6 +345,38 @@ bool SPCSettings::SetDFCCorrMatrix(const MCMath_800::MCSymMatrix& m) {
     return true;
 }
 
+// Row and column r of the results' matrix belong to covariate record r.
+bool SPCSettings::GetCorrMatrixCellCollectionFrom(std::vector<CorrMatrixCell>& cells,
+                                                  const DFCOutputStats* results) {
+    cells.clear();
+    if (results == nullptr) {
+        return false;
+    }
+    const MCMath_800::MCSymMatrix& matrix = results->GetCorrMatrix();
+    const std::vector<DFCOutputStats::DFCVarDistInfo>& records = results->GetCovarDistInfo();
+    const int n = matrix.GetNRows();
+    if (n <= 1) {
+        return true;
+    }
+    // A row without a record would have no name to list.
+    if (static_cast<std::size_t>(n) > records.size()) {
+        return false;
+    }
+    std::vector<std::vector<double>> rows(static_cast<std::size_t>(n));
+    for (int r = 0; r < n; ++r) {
+        if (!matrix.GetRow(r, rows[static_cast<std::size_t>(r)])) {
+            return false;
+        }
+    }
+    for (std::size_t r = 0; r < rows.size(); ++r) {
+        for (std::size_t c = 0; c <= r; ++c) {
+            cells.push_back(
+                CorrMatrixCell{records[r].fFittedVarName, records[c].fFittedVarName, rows[r][c]});
+        }
+    }
+    return true;
+}
+
 // ---------------------------------------------------------------------------------------------
 // Stop criteria
 
@@ -450,6 +485,245 @@ void SPCSettings::CompleteVarInfo(const MCVarList& vars) {
         if (const MCXML_800::IMCVariable* variable = vars.GetVariable(target.fName)) {
             target.fMeasurementLevel = GetMCSPMeasureLevel(variable);
         }
+    }
+}
+
+void SPCSettings::ResetCategEncoding() {
+    fvvCrstabsEncod.clear();
+    fbCategEncoded = false;
+}
+
+// Aligning changes the factors' category lists and dropping rows changes the table, so codes
+// computed before no longer point at the right categories: they are forgotten, and the next
+// EncodeCatValues computes them again.
+void SPCSettings::AdjustCategoricals(const MCVarList& vars) {
+    bool changed = false;
+    for (SimInputSpecs& input : fvSimInputs) {
+        if (!input.IsFinalCategoricalDist()) {
+            continue;
+        }
+        const MCXML_800::IMCVariable* variable = vars.GetVariable(input.GetVarName());
+        if (variable == nullptr) {
+            continue;
+        }
+        std::vector<std::string> before;
+        std::vector<std::string> after;
+        input.GetFinalCategories(before);
+        input.AdjustCategories(variable);
+        input.GetFinalCategories(after);
+        changed = changed || before != after;
+    }
+
+    // Rows name one category per factor; a row too short to name one for a factor is kept,
+    // and EncodeCatValues gives it the code -1 there.
+    bool removed = false;
+    for (std::size_t k = 0; k < fvCrstabsFactors.size(); ++k) {
+        const SimInputSpecs* input = GetSimInput(fvCrstabsFactors[k]);
+        if (input == nullptr || input->GetUnmatchedCagegories().empty()) {
+            continue;
+        }
+        const std::vector<std::string>& unmatched = input->GetUnmatchedCagegories();
+        std::vector<std::vector<std::string>> keptRows;
+        std::vector<double> keptProbs;
+        for (std::size_t r = 0; r < fvvCrstabsMatrix.size(); ++r) {
+            const std::vector<std::string>& row = fvvCrstabsMatrix[r];
+            const bool drop = k < row.size() && std::find(unmatched.begin(), unmatched.end(),
+                                                          row[k]) != unmatched.end();
+            if (drop) {
+                removed = true;
+                continue;
+            }
+            keptRows.push_back(row);
+            if (r < fvCrstabsProbs.size()) {
+                keptProbs.push_back(fvCrstabsProbs[r]);
+            }
+        }
+        // Probabilities without a row (a table whose lists differ in length) stay at the end.
+        for (std::size_t r = fvvCrstabsMatrix.size(); r < fvCrstabsProbs.size(); ++r) {
+            keptProbs.push_back(fvCrstabsProbs[r]);
+        }
+        fvvCrstabsMatrix = std::move(keptRows);
+        fvCrstabsProbs = std::move(keptProbs);
+    }
+    if (removed) {
+        changed = true;
+        double sum = 0.0;
+        for (const double p : fvCrstabsProbs) {
+            sum += p;
+        }
+        if (!fvCrstabsProbs.empty() && sum > 0.0) {
+            for (double& p : fvCrstabsProbs) {
+                p /= sum;
+            }
+        }
+    }
+    if (changed) {
+        ResetCategEncoding();
+    }
+}
+
+void SPCSettings::EncodeCatValues() {
+    if (fbCategEncoded) {
+        return;
+    }
+    const std::size_t nFactors = fvCrstabsFactors.size();
+    std::vector<std::vector<std::string>> categories(nFactors);
+    for (std::size_t k = 0; k < nFactors; ++k) {
+        const SimInputSpecs* input = GetSimInput(fvCrstabsFactors[k]);
+        if (!MCSP_ASSERT(input != nullptr, "pSimInput != 0")) {
+            continue;
+        }
+        const DistInfoElem* dist = input->GetFinalDistribution();
+        if (!MCSP_ASSERT(dist != nullptr, "distElem != 0")) {
+            continue;
+        }
+        std::string name;
+        dist->GetParameterNameValue(0, name, categories[k]);
+    }
+
+    fvvCrstabsEncod.clear();
+    fvvCrstabsEncod.reserve(fvvCrstabsMatrix.size());
+    for (const std::vector<std::string>& row : fvvCrstabsMatrix) {
+        std::vector<int> codes(nFactors, -1);
+        for (std::size_t k = 0; k < nFactors && k < row.size(); ++k) {
+            const std::vector<std::string>& cats = categories[k];
+            const auto it = std::find(cats.begin(), cats.end(), row[k]);
+            if (it != cats.end()) {
+                codes[k] = static_cast<int>(it - cats.begin());
+            }
+        }
+        fvvCrstabsEncod.push_back(std::move(codes));
+    }
+    fbCategEncoded = true;
+}
+
+// ---------------------------------------------------------------------------------------------
+// Completion from fitting results
+
+// The best distribution's parameters come in the order of its parameter names; a Categorical
+// carries its categories as the names and their probabilities as the values, and an
+// Empirical (the fallback when no candidate fits) the minimum, maximum, standard deviation and
+// then the bin proportions.
+void SPCSettings::SetDFCFieldDist(const DFCOutputStats::DFCVarDistInfo& record) {
+    SimInputSpecs* input = GetSimInput(record.fFittedVarName);
+    // A record without a best distribution (a field taking part in the correlations only, or
+    // one nothing was fitted to) has nothing to give: a distribution of type 15 would make
+    // the plan unreadable. A manual input keeps the distribution its user chose.
+    if (input == nullptr || record.fDistBestType == kDistUnknown ||
+        !input->IsRequireAutofitting()) {
+        return;
+    }
+    const std::vector<double>& params = record.fDistBestParams;
+    const std::vector<std::string>& names = record.fDistBestParamNames;
+
+    if (record.fDistBestType == kDistEmpirical) {
+        if (!MCSP_ASSERT(params.size() > 3, "outVarInfo.fDistBestParams.size() > 3")) {
+            return;
+        }
+        // An Empirical distribution prepared without parameters is filled; otherwise the fitted
+        // one is added beside what the input holds, never mixed into a distribution of another
+        // type or into a filled one.
+        DistInfoElem* dist = input->GetDistribution(0);
+        if (dist == nullptr || dist->GetDistType() != kDistEmpirical ||
+            dist->GetParameterSize() != 0) {
+            const int added = input->AddDistribution(kDistEmpirical);
+            dist = added < 0 ? nullptr : input->GetDistribution(static_cast<std::size_t>(added));
+        }
+        if (!MCSP_ASSERT(dist != nullptr, "distElem != 0")) {
+            return;
+        }
+        static_cast<void>(dist->AddParameter("min", params[0]));
+        static_cast<void>(dist->AddParameter("max", params[1]));
+        static_cast<void>(dist->AddParameter("stddev", params[2]));
+        static_cast<void>(
+            dist->AddParameter("probs", std::vector<double>(params.begin() + 3, params.end())));
+        return;
+    }
+
+    const int added = input->AddDistribution(record.fDistBestType);
+    DistInfoElem* dist =
+        added < 0 ? nullptr : input->GetDistribution(static_cast<std::size_t>(added));
+    if (dist == nullptr) {
+        return;
+    }
+    if (record.fDistBestType == kDistCategorical) {
+        static_cast<void>(dist->AddParameter("cats", names));
+        static_cast<void>(dist->AddParameter("probs", params));
+        return;
+    }
+    for (std::size_t i = 0; i < names.size(); ++i) {
+        static_cast<void>(
+            dist->AddParameter(names[i], i < params.size() ? params[i] : MCMV::Missing()));
+    }
+}
+
+// Row r of the fitted matrix belongs to covariate record r. Only records naming a simulated
+// input can be correlation variables, so the matrix is cut down to those records before it is
+// stored (keeping each correlation with its own pair of fields); the other continuous and
+// ordinal inputs without a mapped name follow with identity rows.
+void SPCSettings::SetDFCCorrelations(const DFCOutputStats& results) {
+    fvvCorrMatrix.clear();
+    std::vector<std::string> names;
+    std::vector<int> records;
+    const std::vector<DFCOutputStats::DFCVarDistInfo>& covariates = results.GetCovarDistInfo();
+    for (std::size_t i = 0; i < covariates.size(); ++i) {
+        const std::string& name = covariates[i].fFittedVarName;
+        if (GetSimInput(name) != nullptr &&
+            std::find(names.begin(), names.end(), name) == names.end()) {
+            names.push_back(name);
+            records.push_back(static_cast<int>(i));
+        }
+    }
+
+    const MCMath_800::MCSymMatrix& fitted = results.GetCorrMatrix();
+    const int nFitted = fitted.GetNRows();
+    MCMath_800::MCSymMatrix matched(static_cast<int>(names.size()));
+    for (std::size_t a = 0; a < records.size(); ++a) {
+        for (std::size_t b = 0; b <= a; ++b) {
+            const int ra = records[a];
+            const int rb = records[b];
+            const double value = ra < nFitted && rb < nFitted ? fitted.GetElem(ra, rb)
+                                 : a == b                     ? 1.0
+                                                              : 0.0;
+            matched.SetElem(static_cast<int>(a), static_cast<int>(b), value);
+        }
+    }
+
+    for (const SimInputSpecs& input : fvSimInputs) {
+        const MeasureLevel level = SimInputSpecs::GetEffectMeasurementLevel(input);
+        if (input.GetMapVarName().empty() &&
+            (level == kLevelContinuous || level == kLevelOrdinal) &&
+            std::find(names.begin(), names.end(), input.GetVarName()) == names.end()) {
+            names.push_back(input.GetVarName());
+        }
+    }
+    fvCorrVars = names;
+    // The matched matrix never has more rows than there are variables: this cannot fail.
+    static_cast<void>(SetDFCCorrMatrix(matched));
+}
+
+void SPCSettings::SetDFCOutput(const DFCOutputStats& results) {
+    for (const DFCOutputStats::DFCVarDistInfo& record : results.GetCovarDistInfo()) {
+        SetDFCFieldDist(record);
+    }
+    for (const DFCOutputStats::DFCVarDistInfo& record : results.GetFactorDistInfo()) {
+        SetDFCFieldDist(record);
+    }
+    // Correlations the plan already holds (read from a file or set by the user) are kept.
+    if (fvCorrVars.empty()) {
+        SetDFCCorrelations(results);
+    }
+    // Crosstabs asked for with fewer than two factors give no table. A factor list without
+    // rows would make the simulator draw its cases from an empty table, so the plan then
+    // keeps the table it has.
+    if (results.GetUseCrosstabs() && !results.GetCrstabsMatrix().empty()) {
+        fvCrstabsFactors.clear();
+        for (const DFCOutputStats::DFCVarDistInfo& record : results.GetFactorDistInfo()) {
+            fvCrstabsFactors.push_back(record.fFittedVarName);
+        }
+        fvvCrstabsMatrix = results.GetCrstabsMatrix();
+        fvCrstabsProbs = results.GetCrstabsProbs();
+        ResetCategEncoding();
     }
 }
 

@@ -9,6 +9,7 @@
 // are deep, except for the host's pointers, which are borrowed and copied as pointers.
 #pragma once
 
+#include "distribution_fitting/dfcoutputstats.h"
 #include "mccommon/hostinterfaces.h"
 #include "mccommon/mcstatus.h"
 #include "mccommon/variables.h"
@@ -176,6 +177,12 @@ public:
     void SetCorrMatrixCell(const std::string& rowVar, const std::string& colVar, double value);
     //! Replaces `cells` by the lower triangle of the matrix, diagonal included, row by row.
     void GetCorrMatrixCellCollection(std::vector<CorrMatrixCell>& cells) const;
+    //! Replaces `cells` by the lower triangle, diagonal included, of the fitting results'
+    //! correlation matrix, named by the covariate records. True with no cells for a matrix of
+    //! at most one row; false with no cells when `results` is null, a row cannot be read or
+    //! the matrix has more rows than there are covariate records.
+    static bool GetCorrMatrixCellCollectionFrom(std::vector<CorrMatrixCell>& cells,
+                                                const DFCOutputStats* results);
     //! Makes the continuous and ordinal simulated inputs the correlation variables, with the
     //! identity as their matrix.
     void InitCorrMatrix();
@@ -268,6 +275,26 @@ public:
     //! Gives each target of the first model file whose level is still unknown the level of
     //! the variable of that name in `vars`.
     void CompleteVarInfo(const MCXML_800::MCVarList& vars);
+    //! Aligns every Categorical input that `vars` knows with the host's categories
+    //! (SimInputSpecs::AdjustCategories), then drops the contingency-table rows that name a
+    //! category the data lacks and rescales the remaining probabilities to sum to 1.
+    void AdjustCategoricals(const MCXML_800::MCVarList& vars);
+    //! Turns the contingency table's category texts into positions in the factors' category
+    //! lists (-1 for a text that is not there). Done once; later calls do nothing until the
+    //! table or the categories change.
+    void EncodeCatValues();
+
+    // ---- Completion from fitting results -------------------------------------------------
+
+    //! Gives every autofit input its best fitted distribution (covariate records, then factor
+    //! records); when the plan has no correlation variables yet, takes the fitted correlations
+    //! of the covariates (identity for the other continuous and ordinal inputs); and, when
+    //! the results hold a contingency table, takes it with the factor records as its factors.
+    void SetDFCOutput(const DFCOutputStats& results);
+    //! Adds the best distribution of `record` to the autofit input of the same name. Records
+    //! without a best distribution, inputs that are not in the plan and manual inputs are
+    //! left alone.
+    void SetDFCFieldDist(const DFCOutputStats::DFCVarDistInfo& record);
 
     //! No check is made: always success.
     MCCommon_800::MCStatus IsValidSettings() const { return MCCommon_800::MCStatus(); }
@@ -280,6 +307,11 @@ private:
     void NoteIteration(std::size_t nValues, int position, DistInputType type);
     //! Position of `name` among the correlation variables, appending it when absent.
     std::size_t CorrVarPosition(const std::string& name);
+    //! Takes the covariates' fitted correlations over a fresh list of correlation variables.
+    void SetDFCCorrelations(const DFCOutputStats& results);
+    //! Forgets the category codes of the contingency table, which no longer match its texts
+    //! or the factors' categories.
+    void ResetCategEncoding();
 
     std::vector<ModelFileElem> fvModelFiles;    //!< model files
     std::vector<SimInputSpecs> fvSimInputs;     //!< simulated inputs
