@@ -4,7 +4,7 @@ BUILD_DIR ?= build
 JOBS ?= $(shell nproc)
 CMAKE_FLAGS ?=
 
-.PHONY: deps configure build test demo bench format clean
+.PHONY: deps configure build test sanitize demo bench format clean
 
 deps:
 	@bash scripts/install-deps.sh
@@ -17,6 +17,12 @@ build: configure
 
 test: build
 	@cd $(BUILD_DIR) && ctest --output-on-failure -j $(JOBS)
+
+# The whole suite under AddressSanitizer and UndefinedBehaviorSanitizer, in its own folder.
+sanitize: deps
+	@cmake -S . -B $(BUILD_DIR)-asan -DMCSIM_SANITIZE=address,undefined -DMCSIM_BUILD_BENCH=OFF $(CMAKE_FLAGS) >/dev/null
+	@cmake --build $(BUILD_DIR)-asan -j $(JOBS)
+	@cd $(BUILD_DIR)-asan && ctest --output-on-failure -j $(JOBS)
 
 demo: build
 	@bash scripts/demo.sh $(BUILD_DIR)
