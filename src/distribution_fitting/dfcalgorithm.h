@@ -7,10 +7,9 @@
 // factors' contingency table); the moment or start estimates of every candidate distribution
 // and the factors' categorical distributions; then OptimizeDistParams (maximum likelihood),
 // ComputeChiSquare (discrete covariates), a restart of the records and PerformFitGoodness
-// (EDF tests and best fits of continuous covariates). Those three steps are filled in by the
-// later fitting work; until then the covariates keep their moment and start estimates, with
-// no test statistic and no best fit. Both data passes stream: memory depends on the numbers
-// of fields, categories, bins and contingency cells, not on the number of records.
+// (EDF tests and best fits of continuous covariates). Both descriptive passes stream: memory
+// depends on the numbers of fields, categories, bins and contingency cells, not on the number
+// of records; the EDF pass stores each continuous covariate's values for sorting.
 #pragma once
 
 #include "component/mcspcomponent.h"
@@ -169,16 +168,29 @@ private:
     void FinishSecondPass();
     //! Moment or start estimates of every candidate; the factors' Categorical and best fit.
     MCStatus SetInitialDistParams();
-    //! Maximum-likelihood step of the NegBin, Gamma and Beta candidates; for now it leaves
-    //! the moment estimates as they are.
+    //! Maximum-likelihood step of the NegBin, Gamma and Beta candidates, in worker tasks.
     MCStatus OptimizeDistParams(MCCommon_800::MultiPassRecordIter& trainData);
-    //! Chi-square step of the discrete covariates; for now it tests nothing.
+    //! Chi-square tests and best fits of the discrete covariates.
     MCStatus ComputeChiSquare();
-    //! EDF and best-fit step of the continuous covariates; for now it tests nothing.
+    //! EDF pass, Anderson-Darling and Kolmogorov-Smirnov tests and best fits of the
+    //! continuous covariates.
     MCStatus PerformFitGoodness(MCCommon_800::MultiPassRecordIter& trainData);
     //! The text of category `code` of a factor variable: its encoder's text, or the code in
     //! decimal when the variable has no such category (so distinct codes keep distinct texts).
     static std::string GetCategoryText(const MCXML_800::IMCVariable* variable, int code);
+
+    // Goodness of fit (dfcfitgoodness.cpp)
+    //! The EDF pass, the sort of each listed covariate's values, one goodness-of-fit task per
+    //! (listed covariate, continuous candidate) and the best-fit choice; 1 when cancelled.
+    MCStatus ComputeFitGoodness(MCCommon_800::MultiPassRecordIter& trainData);
+    //! The EDF pass: every valid record's weight and the values of the listed covariates.
+    MCStatus StoreGoodFitValues(MCCommon_800::MultiPassRecordIter& trainData);
+    //! The best fit, best A² and best D types, reported elements and warnings of listed
+    //! covariate `covariate` once its tasks have run.
+    void ChooseEdfBestFit(int covariate);
+    //! Appends the Empirical element of continuous covariate `covariate` (extremes, standard
+    //! deviation, histogram proportions) and makes it the best when there is none.
+    void AddContinuousEmpirical(int covariate);
 
     // 1. Settings and variables.
     DFCSettings fSettings;                 //!< private copy of the host's settings

@@ -145,7 +145,9 @@ void ExpectVectorNear(const std::vector<double>& actual, const std::vector<doubl
 }
 
 //! Everything the two passes and the initial estimates produced, for comparing two runs.
-void ExpectSameResults(FitRun& a, FitRun& b, double rel) {
+// `iterRel` applies to the iteratively fitted candidates (NegBin, Weibull, Gamma, Beta): their
+// solvers stop at a tolerance, so sums accumulated in another order may stop a little apart.
+void ExpectSameResults(FitRun& a, FitRun& b, double rel, double iterRel) {
     const DFCOutputStats& ra = a.Results();
     const DFCOutputStats& rb = b.Results();
     EXPECT_TRUE(mctest::Near(a.Algo().GetValidWeight(), b.Algo().GetValidWeight(), rel));
@@ -159,8 +161,10 @@ void ExpectSameResults(FitRun& a, FitRun& b, double rel) {
             const auto uk = static_cast<std::size_t>(k);
             EXPECT_EQ(ia.fDistElements[uk].fbDistAllowed, ib.fDistElements[uk].fbDistAllowed)
                 << "covariate " << i << " type " << k;
+            const bool iterative = k == kDistNegbinomial || k == kDistWeibull ||
+                                   k == kDistGamma || k == kDistBeta;
             ExpectVectorNear(ia.fDistElements[uk].fDistParams, ib.fDistElements[uk].fDistParams,
-                             rel, "parameters of type " + std::to_string(k));
+                             iterative ? iterRel : rel, "parameters of type " + std::to_string(k));
         }
         const DFCHistogramData* ha = a.Algo().GetCovariateHistogram(c);
         const DFCHistogramData* hb = b.Algo().GetCovariateHistogram(c);
@@ -333,7 +337,7 @@ TEST(FittingInvariants, IntegerWeightsEqualRepeatedRows) {
     FitRun b(repeated, ReferenceSettings(false));
     ASSERT_TRUE(a.Build().IsOK());
     ASSERT_TRUE(b.Build().IsOK());
-    ExpectSameResults(a, b, kStatTol);
+    ExpectSameResults(a, b, kStatTol, 1e-4);
 }
 
 TEST(FittingInvariants, CaseLimitAppliesToBothPasses) {
@@ -351,7 +355,7 @@ TEST(FittingInvariants, CaseLimitAppliesToBothPasses) {
         }
         EXPECT_EQ(a.Algo().GetNRecords(), limit);
         EXPECT_EQ(a.Algo().GetNValidRecords(), b.Algo().GetNValidRecords());
-        ExpectSameResults(a, b, 0.0);
+        ExpectSameResults(a, b, 0.0, 0.0);
     }
 }
 
@@ -414,8 +418,9 @@ TEST_P(SupportChecks, DropCandidatesOutsideTheirSupportOncePerType) {
 // clang-format off
 INSTANTIATE_TEST_SUITE_P(Table, SupportChecks, ::testing::Values(
     // name, values, weights, level; allowed, dropped with a warning, with an estimate
+    // Normal keeps its estimate but the chi-square step drops it: no count bin remains.
     SupportCase{"HalfLosesTheCounts", {1.0, 2.0, 2.5, 3.0}, {}, kLevelOrdinal,
-                {0, 1, 4, 5}, {0, 1, 5}, {4}},
+                {0, 1, 4, 5}, {0, 1, 4, 5}, {4}},
     SupportCase{"ZeroLosesLogNormalAndGamma", {0.0, 1.0, 2.0, 3.5}, {}, kLevelContinuous,
                 {3, 9, 11}, {3, 9}, {11}},
     SupportCase{"NegativeLosesPositiveTypes", {-1.0, 0.5, 2.0}, {}, kLevelContinuous,
