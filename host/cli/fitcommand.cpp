@@ -1,0 +1,746 @@
+#include "cli/fitcommand.h"
+
+#include "cli/interrupt.h"
+#include "cli/progress.h"
+#include "cli/statustext.h"
+#include "common/atomicfile.h"
+#include "common/hosterror.h"
+#include "data/csvrecorditer.h"
+#include "data/datadictionary.h"
+#include "distribution_fitting/dfcalgorithm.h"
+#include "mccommon/mcmv.h"
+#include "mccommon/numtext.h"
+#include "mcthread/mcthread.h"
+#include "models/formulamodel.h"
+#include "simulation_common/mcplanxmlhandler.h"
+#include "simulation_common/spcsettings.h"
+
+#include <algorithm>
+#include <cmath>
+#include <filesystem>
+#include <iomanip>
+#include <map>
+#include <set>
+#include <sstream>
+#include <thread>
+
+namespace MCHost {
+
+using MCCommon_800::MCMV;
+using MCCommon_800::MCStatus;
+using MCHost::FormulaModel;
+using MCMCSP_800::DFCAlgorithm;
+using MCMCSP_800::DFCOutputStats;
+using MCMCSP_800::DFCSettings;
+using MCMCSP_800::SPCSettings;
+using namespace MCSPConst;
+
+namespace {
+
+//! Candidates of a continuous field: every continuous family the fitting knows.
+const std::vector<DistType> kContinuousCandidates = {
+    kDistLognormal, kDistNormal, kDistTriangular, kDistUniform,
+    kDistWeibull,   kDistGamma,  kDistBeta,       kDistExponential};
+//! Candidates of an ordinal field: the discrete families tested by chi-square.
+const std::vector<DistType> kOrdinalCandidates = {kDistBinomial, kDistNegbinomial, kDistPoisson};
+//! Rows of the contingency table printed before the rest is summarised.
+constexpr std::size_t kMaxTableRows = 24;
+//! Values of a parameter list printed in full; longer lists show their ends.
+constexpr std::size_t kMaxListValues = 8;
+
+//! Thrown out of the data dictionary's reading when the user interrupts it.
+struct ReadCancelled {};
+
+// ------------------------------------------------------------------------------------------
+// Options to settings
+
+//! Reads the --level entries NAME=LEVEL and the --factors into one map; throws on a bad one.
+std::map<std::string, MeasureLevel> CollectLevels(const FitOptions& options) {
+    std::map<std::string, MeasureLevel> levels;
+    for (const std::string& entry : options.fvLevels) {
+        const std::size_t eq = entry.rfind('=');
+        MeasureLevel level = kLevelUnknown;
+        if (eq == std::string::npos || eq == 0 || !ParseMeasureLevel(entry.substr(eq + 1), level)) {
+            throw HostError("--level " + entry +
+                            ": expected NAME=LEVEL with LEVEL continuous, ordinal or "
+                            "categorical");
+        }
+        levels[entry.substr(0, eq)] = level;
+    }
+    for (const std::string& name : options.fvFactors) {
+        const auto it = levels.find(name);
+        if (it != levels.end() && it->second != kLevelCategorical) {
+            throw HostError("field '" + name + "' is a factor (--factors) and " +
+                            MeasureLevelName(it->second) + " (--level) at once");
+        }
+        levels[name] = kLevelCategorical;
+    }
+    return levels;
+}
+
+char ParseDelimiter(const std::string& text) {
+    if (text == "tab" || text == "\\t" || text == "\t") {
+        return '\t';
+    }
+    if (text.size() != 1 || text[0] == '"' || text[0] == '\n' || text[0] == '\r') {
+        throw HostError("--delimiter " + text + ": expected one character (or 'tab')");
+    }
+    return text[0];
+}
+
+void AppendUnique(std::vector<std::string>& list, const std::string& name) {
+    if (std::find(list.begin(), list.end(), name) == list.end()) {
+        list.push_back(name);
+    }
+}
+
+//! The fields to fit, in the order the user named them (file order by default).
+std::vector<std::string> FieldsToFit(const FitOptions& options, const DataDictionary& dict) {
+    std::vector<std::string> fields;
+    if (options.fvFields.empty()) {
+        for (const DataField& f : dict.GetFields()) {
+            if (f.fName != options.fWeight) {
+                fields.push_back(f.fName);
+            }
+        }
+    } else {
+        for (const std::string& name : options.fvFields) {
+            AppendUnique(fields, name);
+        }
+    }
+    for (const std::string& name : options.fvFactors) {
+        AppendUnique(fields, name);
+    }
+    if (!options.fWeight.empty() &&
+        std::find(fields.begin(), fields.end(), options.fWeight) != fields.end()) {
+        throw HostError("field '" + options.fWeight +
+                        "' is the frequency weight; it cannot be fitted as well");
+    }
+    return fields;
+}
+
+//! Fills the fitting settings from the options and the dictionary; throws on a field that
+//! cannot take its role.
+void FillSettings(const FitOptions& options, const DataDictionary& dict,
+                  const std::vector<std::string>& fields, MCThread_800::IMCThreadFactory& threads,
+                  DFCSettings& settings) {
+    for (const std::string& name : fields) {
+        const int index = dict.FindField(name);
+        const DataField& field = dict.GetFields()[static_cast<std::size_t>(index)];
+        int added = -1;
+        switch (field.fLevel) {
+        case kLevelCategorical: {
+            const int nCategories =
+                static_cast<int>(field.fbText ? field.fvTexts.size() : field.fvNumbers.size());
+            if (nCategories < 1) {
+                throw HostError(
+                    LocatedMessage(dict.GetPath(), 0, "field '" + name + "' has no values to fit"));
+            }
+            added = settings.AddFactor(index, nCategories, {kDistCategorical}, kLevelCategorical,
+                                       false);
+            break;
+        }
+        case kLevelOrdinal:
+            added = settings.AddCovariate(index, kOrdinalCandidates, kLevelOrdinal, false);
+            break;
+        default:
+            added = settings.AddCovariate(index, kContinuousCandidates, kLevelContinuous, false);
+            break;
+        }
+        if (added < 0) {
+            throw HostError("field '" + name + "' cannot be fitted");
+        }
+    }
+    if (!options.fWeight.empty()) {
+        const int index = dict.FindField(options.fWeight);
+        const DataField& weight = dict.GetFields()[static_cast<std::size_t>(index)];
+        // A categorical field's records carry category codes, not the numbers to count by.
+        if (weight.fbText || weight.fLevel == kLevelCategorical) {
+            throw HostError(LocatedMessage(dict.GetPath(), 0,
+                                           "the weight field '" + options.fWeight + "' " +
+                                               (weight.fbText ? "holds text" : "is categorical") +
+                                               ", not numbers to count rows by"));
+        }
+        if (!settings.SetFrequencyWeightVar(index)) {
+            throw HostError("field '" + options.fWeight + "' cannot be the frequency weight");
+        }
+    }
+    settings.SetGFType(options.fTest == "ks" ? kKolmogorovSmirnov : kAndersonDarling);
+    // Interactive mode computes both statistics; the best fit still follows the type.
+    settings.SetInteractiveMode(options.fTest == "both");
+    settings.SetUseCrosstabs(options.fbCrosstabs);
+    settings.SetExportCrosstabs(options.fbCrosstabs);
+    settings.SetNCases(options.fCases);
+    settings.SetBins(options.fBins);
+    int nThreads = options.fThreads;
+    if (nThreads < 1) {
+        nThreads = static_cast<int>(std::max(1u, std::thread::hardware_concurrency()));
+    }
+    settings.SetMaxThreadNum(nThreads);
+    settings.SetThreadFactory(&threads);
+}
+
+// ------------------------------------------------------------------------------------------
+// Printing the results
+
+std::string Num(double x) {
+    return MCMV::IsMissing(x) ? std::string("missing") : MCCommon_800::FormatDefault(x);
+}
+
+//! "name = value, ..." in parameter-name order. Values beyond the names belong to the last
+//! name (the proportions of an empirical distribution); a long list shows its ends only.
+std::string Params(const std::vector<std::string>& names, const std::vector<double>& values) {
+    std::string out;
+    const std::size_t nScalars = names.empty() ? 0 : std::min(names.size() - 1, values.size());
+    for (std::size_t i = 0; i < nScalars; ++i) {
+        out += (i == 0 ? "" : ", ") + names[i] + " = " + Num(values[i]);
+    }
+    if (nScalars == values.size()) {
+        return out;
+    }
+    const std::size_t nList = values.size() - nScalars;
+    std::string list;
+    for (std::size_t i = nScalars; i < values.size(); ++i) {
+        const std::size_t k = i - nScalars;
+        if (nList > kMaxListValues && k >= kMaxListValues - 2 && k < nList - 2) {
+            if (k == kMaxListValues - 2) {
+                list += ", ...";
+            }
+            continue;
+        }
+        list += (k == 0 ? "" : ", ") + Num(values[i]);
+    }
+    if (nList > 1 && names.size() >= 1) {
+        list = "[" + list + "]" +
+               (nList > kMaxListValues ? " (" + std::to_string(nList) + " values)" : std::string());
+    }
+    out += (out.empty() ? "" : ", ") + (names.empty() ? "" : names.back() + " = ") + list;
+    return out;
+}
+
+//! The statistics an element holds, as "A-D 0.21 (p 0.85)"; "" when none.
+std::string Stats(const DFCOutputStats::DFCVarDistElement& e) {
+    std::string out;
+    auto add = [&](const char* label, double stat, double p) {
+        if (MCMV::IsMissing(stat)) {
+            return;
+        }
+        out += (out.empty() ? "" : "; ") + std::string(label) + " " + Num(stat);
+        if (!MCMV::IsMissing(p)) {
+            out += " (p " + Num(p) + ")";
+        }
+    };
+    add("chi-square", e.fChiSquareFit, e.fChiSquarePValue);
+    add("A-D", e.fADFit, e.fADPValue);
+    add("K-S", e.fKSFit, e.fKSPValue);
+    return out;
+}
+
+std::string StatisticName(MeasureLevel level, GoodFitType type) {
+    if (level != kLevelContinuous) {
+        return "chi-square";
+    }
+    return type == kKolmogorovSmirnov ? "Kolmogorov-Smirnov" : "Anderson-Darling";
+}
+
+void PrintCovariate(std::ostream& out, const DFCOutputStats::DFCVarDistInfo& info,
+                    const DFCSettings::VarInfoElem& allowed, const DataField& field,
+                    GoodFitType type) {
+    out << "\n" << info.fFittedVarName << "  (" << MeasureLevelName(info.fMeasureLevel);
+    if (info.fMeasureLevel == kLevelOrdinal) {
+        out << ", " << field.fvNumbers.size() << " distinct values";
+    }
+    out << ")\n";
+    if (info.fDistBestType != kDistUnknown) {
+        out << "  best fit   " << info.fDistBestName;
+        const std::string params = Params(info.fDistBestParamNames, info.fDistBestParams);
+        if (!params.empty()) {
+            out << "  " << params;
+        }
+        if (!MCMV::IsMissing(info.fBestFitStat)) {
+            out << "  " << StatisticName(info.fMeasureLevel, type) << " " << Num(info.fBestFitStat);
+        }
+        if (!MCMV::IsMissing(info.fBestFitPValue)) {
+            out << ", p-value " << Num(info.fBestFitPValue);
+        }
+        out << "\n";
+    } else {
+        out << "  best fit   none in the results\n";
+    }
+
+    std::set<DistType> listed;
+    if (!info.fReportedElements.empty()) {
+        out << "  ranked candidates\n";
+        int rank = 0;
+        for (const auto& e : info.fReportedElements) {
+            listed.insert(e.fDistType);
+            out << "    " << std::setw(2) << ++rank << ". " << std::left << std::setw(12)
+                << e.fDistName << std::right << " " << Params(e.fDistParamNames, e.fDistParams);
+            const std::string stats = Stats(e);
+            if (!stats.empty()) {
+                out << "   " << stats;
+            }
+            out << "\n";
+        }
+    }
+    bool header = false;
+    std::string dropped;
+    for (const auto& e : info.fDistElements) {
+        if (listed.count(e.fDistType) != 0 || !allowed.IsDistAllowed(e.fDistType)) {
+            continue;
+        }
+        if (!e.fbDistAllowed) {
+            dropped += (dropped.empty() ? "" : ", ") + e.fDistName;
+            continue;
+        }
+        if (!header) {
+            out << (listed.empty() ? "  candidates (no test statistic in the results)\n"
+                                   : "  other candidates\n");
+            header = true;
+        }
+        out << "        " << std::left << std::setw(12) << e.fDistName << std::right << " "
+            << Params(e.fDistParamNames, e.fDistParams);
+        const std::string stats = Stats(e);
+        if (!stats.empty()) {
+            out << "   " << stats;
+        }
+        out << "\n";
+    }
+    if (!dropped.empty()) {
+        out << "  dropped    " << dropped << "\n";
+    }
+}
+
+void PrintFactor(std::ostream& out, const DFCOutputStats::DFCVarDistInfo& info) {
+    out << "\n"
+        << info.fFittedVarName << "  (categorical, " << info.fCategoryCounts.size()
+        << " categories seen)\n";
+    if (info.fDistBestType == kDistUnknown) {
+        out << "  best fit   none in the results\n";
+        return;
+    }
+    out << "  best fit   " << info.fDistBestName << "\n";
+    for (std::size_t c = 0; c < info.fDistBestParams.size(); ++c) {
+        const std::string label =
+            c < info.fDistBestParamNames.size() ? info.fDistBestParamNames[c] : Num(double(c));
+        out << "    " << std::left << std::setw(20) << label << std::right << " "
+            << Num(info.fDistBestParams[c]) << "\n";
+    }
+}
+
+void PrintCorrelations(std::ostream& out, const DFCOutputStats& stats) {
+    const auto& covariates = stats.GetCovarDistInfo();
+    const auto& corr = stats.GetCorrMatrix();
+    const int n = std::min(static_cast<int>(covariates.size()), corr.GetNRows());
+    if (n < 2) {
+        return;
+    }
+    out << "\ncorrelations\n";
+    std::size_t width = 8;
+    for (int i = 0; i < n; ++i) {
+        width = std::max(width, covariates[static_cast<std::size_t>(i)].fFittedVarName.size());
+    }
+    width = std::min<std::size_t>(width, 16);
+    for (int i = 0; i < n; ++i) {
+        out << "  " << std::left << std::setw(static_cast<int>(width))
+            << covariates[static_cast<std::size_t>(i)].fFittedVarName.substr(0, width)
+            << std::right;
+        for (int j = 0; j <= i; ++j) {
+            std::ostringstream cell;
+            const double r = corr.GetElem(i, j);
+            if (MCMV::IsMissing(r)) {
+                cell << "missing";
+            } else {
+                cell << std::fixed << std::setprecision(3) << r;
+            }
+            out << " " << std::setw(8) << cell.str();
+        }
+        out << "\n";
+    }
+}
+
+void PrintCrosstabs(std::ostream& out, const DFCOutputStats& stats) {
+    const auto& rows = stats.GetCrstabsMatrix();
+    const auto& probs = stats.GetCrstabsProbs();
+    if (rows.empty()) {
+        return;
+    }
+    out << "\ncontingency table of the categorical fields (" << rows.size() << " cells)\n";
+    for (std::size_t r = 0; r < rows.size() && r < kMaxTableRows; ++r) {
+        std::string cell;
+        for (const std::string& text : rows[r]) {
+            cell += (cell.empty() ? "" : " x ") + text;
+        }
+        out << "  " << std::left << std::setw(36) << cell << std::right << " "
+            << (r < probs.size() ? Num(probs[r]) : std::string("missing")) << "\n";
+    }
+    if (rows.size() > kMaxTableRows) {
+        out << "  ... " << rows.size() - kMaxTableRows << " more cells\n";
+    }
+}
+
+void PrintWarnings(std::ostream& out, const std::vector<MCStatus>& warnings) {
+    std::map<std::pair<long, bool>, int> counts;
+    for (const MCStatus& s : warnings) {
+        if (!s.IsOK()) {
+            ++counts[{s.GetErrorCode(), s.IsWarning()}];
+        }
+    }
+    if (counts.empty()) {
+        return;
+    }
+    out << "\nwarnings\n";
+    for (const auto& [key, count] : counts) {
+        out << "  " << std::setw(4) << count << " x " << StatusText(MCStatus(key.first, key.second))
+            << " (" << key.first << ")\n";
+    }
+}
+
+// ------------------------------------------------------------------------------------------
+// The plan and the statistics document
+
+//! A --fixed entry NAME=VALUE.
+struct FixedValue {
+    std::string fName; //!< input name
+    double fValue;     //!< its value
+};
+
+std::vector<FixedValue> ParseFixed(const std::vector<std::string>& entries) {
+    std::vector<FixedValue> fixed;
+    for (const std::string& entry : entries) {
+        const std::size_t eq = entry.find('=');
+        double value = 0.0;
+        if (eq == std::string::npos || eq == 0 ||
+            !MCCommon_800::ParseDouble(entry.substr(eq + 1), value) || !std::isfinite(value)) {
+            throw HostError("--fixed " + entry + ": expected NAME=NUMBER");
+        }
+        fixed.push_back(FixedValue{entry.substr(0, eq), value});
+    }
+    return fixed;
+}
+
+//! The model path as the plan records it: relative to the plan's folder when possible, so the
+//! two files can move together.
+std::string ModelPathForPlan(const std::string& modelPath, const std::string& planPath) {
+    namespace fs = std::filesystem;
+    std::error_code ec;
+    const fs::path planDir = fs::absolute(fs::path(planPath), ec).parent_path();
+    const fs::path model = fs::absolute(fs::path(modelPath), ec);
+    if (ec) {
+        return modelPath;
+    }
+    const fs::path relative = model.lexically_relative(planDir);
+    return relative.empty() ? model.string() : relative.generic_string();
+}
+
+//! Builds the plan from the fitted fields and the results, with the model file and its
+//! targets. Notes about the plan go to `err`.
+SPCSettings BuildPlan(const FitOptions& options, const DataDictionary& dict,
+                      const std::vector<std::string>& fields, const DFCOutputStats& results,
+                      const FormulaModel* model, std::ostream& err) {
+    SPCSettings plan;
+    for (const std::string& name : fields) {
+        const DataField& field = dict.GetFields()[static_cast<std::size_t>(dict.FindField(name))];
+        MCMCSP_800::SimInputSpecs input(false);
+        input.SetVarName(name);
+        input.SetVarLevel(field.fLevel);
+        input.SetValueType(field.fbText ? MCXML_800::IMCVariable::kStringStorage
+                                        : MCXML_800::IMCVariable::kNumericStorage);
+        static_cast<void>(input.SetDefaultAutofit());
+        plan.AddSimulationInput(input);
+    }
+    for (const FixedValue& f : ParseFixed(options.fvFixed)) {
+        if (plan.CheckExist(f.fName)) {
+            throw HostError("--fixed " + f.fName + ": the field is already a simulated input");
+        }
+        plan.AddFixedInput(f.fName, std::vector<double>{f.fValue}, "");
+    }
+    plan.SetAutoFitNCases(options.fCases);
+    plan.SetAutoFitType(options.fTest == "ks" ? kKolmogorovSmirnov : kAndersonDarling);
+    plan.SetBins(options.fBins);
+    plan.SetDFCOutput(results);
+    for (const MCMCSP_800::SimInputSpecs& input : plan.GetSimulationInput()) {
+        if (input.GetDistElementSize() == 0) {
+            err << "mcsim: note: field '" << input.GetVarName()
+                << "' has no fitted distribution; the plan leaves it without one\n";
+        }
+    }
+    if (model) {
+        plan.SetModel(ModelPathForPlan(options.fModelPath, options.fPlanPath), false);
+        for (const FormulaTarget& t : model->GetTargets()) {
+            if (!options.fvTargets.empty() &&
+                std::find(options.fvTargets.begin(), options.fvTargets.end(), t.fName) ==
+                    options.fvTargets.end()) {
+                continue;
+            }
+            SPCSettings::ModelFileTarget target;
+            target.fName = t.fName;
+            target.fMeasurementLevel = t.fbCategorical ? kLevelCategorical : kLevelContinuous;
+            plan.AddModelTarget(target);
+        }
+    }
+    return plan;
+}
+
+//! Reads the model and checks it against the plan's inputs; throws with the model's message.
+FormulaModel LoadModelFor(const FitOptions& options, const std::vector<std::string>& fields) {
+    FormulaModel model = FormulaModel::Load(options.fModelPath);
+    std::vector<std::string> inputs = fields;
+    for (const FixedValue& f : ParseFixed(options.fvFixed)) {
+        inputs.push_back(f.fName);
+    }
+    const std::string problem = model.CheckInputs(inputs);
+    if (!problem.empty()) {
+        throw HostError(problem + "; the plan's inputs are the fitted fields and the --fixed "
+                                  "inputs");
+    }
+    for (const std::string& name : options.fvTargets) {
+        const auto& targets = model.GetTargets();
+        if (std::none_of(targets.begin(), targets.end(),
+                         [&](const FormulaTarget& t) { return t.fName == name; })) {
+            throw HostError(
+                LocatedMessage(options.fModelPath, 0,
+                               "--targets names '" + name + "', which the model does not define"));
+        }
+    }
+    return model;
+}
+
+} // namespace
+
+CLI::App* AddFitCommand(CLI::App& app, FitOptions& options) {
+    CLI::App* fit = app.add_subcommand(
+        "fit", "Fit distributions to the fields of a CSV data file and print the results");
+    fit->add_option("data", options.fDataPath, "CSV data file with a header row")->required();
+    fit->add_option("--fields", options.fvFields,
+                    "Fields to fit, comma-separated (default: every field but the weight)")
+        ->delimiter(',')
+        ->expected(1)
+        ->multi_option_policy(CLI::MultiOptionPolicy::TakeAll);
+    fit->add_option("--factors", options.fvFactors,
+                    "Fields to fit as categorical factors, comma-separated")
+        ->delimiter(',')
+        ->expected(1)
+        ->multi_option_policy(CLI::MultiOptionPolicy::TakeAll);
+    fit->add_option("--weight", options.fWeight, "Frequency weight field");
+    fit->add_option("--level", options.fvLevels,
+                    "Measurement level of a field, NAME=continuous|ordinal|categorical "
+                    "(repeatable)")
+        ->expected(1)
+        ->multi_option_policy(CLI::MultiOptionPolicy::TakeAll);
+    fit->add_option("--test", options.fTest,
+                    "Goodness-of-fit test for continuous fields: ad (Anderson-Darling), ks "
+                    "(Kolmogorov-Smirnov) or both (best fit by Anderson-Darling)")
+        ->check(CLI::IsMember({"ad", "ks", "both"}))
+        ->capture_default_str();
+    fit->add_flag("--crosstabs", options.fbCrosstabs,
+                  "Fit the joint contingency table of the categorical fields");
+    fit->add_option("--cases", options.fCases, "Use only the first N rows (0: all)")
+        ->check(CLI::NonNegativeNumber)
+        ->capture_default_str();
+    fit->add_option("--bins", options.fBins, "Histogram bins of continuous fields")
+        ->check(CLI::Range(2, 100000))
+        ->capture_default_str();
+    fit->add_option("--threads", options.fThreads, "Worker threads (0: one per processor)")
+        ->check(CLI::Range(0, 1024))
+        ->capture_default_str();
+    fit->add_option("--delimiter", options.fDelimiter,
+                    "Field separator of the file ('tab' for "
+                    "a tab)")
+        ->capture_default_str();
+    fit->add_option("--max-ordinal-values", options.fMaxOrdinalValues,
+                    "Whole-number fields with at most this many distinct values are ordinal")
+        ->check(CLI::Range(1, 1000))
+        ->capture_default_str();
+    fit->add_option("-o,--output", options.fPlanPath,
+                    "Write the simulation plan to this file (XML)");
+    fit->add_option("--fit-stats", options.fFitStatsPath,
+                    "Write the fitting statistics document to this file (XML)");
+    fit->add_option("--model", options.fModelPath,
+                    "Formula model file to record in the plan (needs -o)");
+    fit->add_option("--targets", options.fvTargets,
+                    "Model targets to record in the plan, comma-separated (default: all)")
+        ->delimiter(',')
+        ->expected(1)
+        ->multi_option_policy(CLI::MultiOptionPolicy::TakeAll);
+    fit->add_option("--fixed", options.fvFixed,
+                    "A fixed input of the plan, NAME=NUMBER (repeatable; needs -o)")
+        ->expected(1)
+        ->multi_option_policy(CLI::MultiOptionPolicy::TakeAll);
+    return fit;
+}
+
+int RunFit(const FitOptions& options, std::ostream& out, std::ostream& err) {
+    InterruptWatcher interrupt;
+    ProgressBar progress(options.fbProgress);
+    try {
+        DataOptions dataOptions;
+        dataOptions.fDelimiter = ParseDelimiter(options.fDelimiter);
+        dataOptions.fLevels = CollectLevels(options);
+        dataOptions.fMaxOrdinalValues = options.fMaxOrdinalValues;
+        if (!options.fvFields.empty()) {
+            dataOptions.fvFields = options.fvFields;
+            for (const std::string& name : options.fvFactors) {
+                AppendUnique(dataOptions.fvFields, name);
+            }
+            if (!options.fWeight.empty()) {
+                AppendUnique(dataOptions.fvFields, options.fWeight);
+            }
+        }
+        const std::string& path = options.fDataPath;
+        const DataDictionary dict =
+            DataDictionary::Build(path, dataOptions, [&](std::uint64_t done, std::uint64_t total) {
+                if (interrupt.IsCancelled()) {
+                    throw ReadCancelled();
+                }
+                progress.Show("reading " + path, done, total);
+            });
+        progress.Clear();
+        if (!options.fWeight.empty() && dict.FindField(options.fWeight) < 0) {
+            throw HostError(
+                LocatedMessage(path, 0, "unknown weight field '" + options.fWeight + "'"));
+        }
+        if (dict.GetNRows() == 0) {
+            throw HostError(LocatedMessage(path, 0, "the file has a header but no data rows"));
+        }
+        const std::vector<std::string> fields = FieldsToFit(options, dict);
+        if (fields.empty()) {
+            throw HostError(LocatedMessage(path, 0, "there is no field to fit"));
+        }
+        if (options.fPlanPath.empty() && (!options.fModelPath.empty() ||
+                                          !options.fvTargets.empty() || !options.fvFixed.empty())) {
+            throw HostError("--model, --targets and --fixed describe the plan: add -o PLAN.xml");
+        }
+        if (options.fModelPath.empty() && !options.fvTargets.empty()) {
+            throw HostError("--targets needs --model");
+        }
+        // The model is read before the fitting, so a bad model costs no data passes.
+        std::unique_ptr<FormulaModel> model;
+        if (!options.fModelPath.empty()) {
+            model = std::make_unique<FormulaModel>(LoadModelFor(options, fields));
+        }
+
+        MCThread_800::MCStdThreadFactory threads;
+        DFCSettings settings;
+        FillSettings(options, dict, fields, threads, settings);
+        if (options.fbCrosstabs && settings.GetFactors().size() < 2) {
+            err << "mcsim: note: --crosstabs needs at least two categorical fields; no "
+                   "contingency table is fitted\n";
+        }
+
+        DFCAlgorithm algorithm(settings, dict.GetVarList());
+        algorithm.SetCancelPtr(&interrupt);
+        interrupt.SetTarget(&algorithm);
+        CsvRecordIter records(dict);
+        records.SetProgress([&](int pass, std::uint64_t done, std::uint64_t total) {
+            progress.Show("fitting: data pass " + std::to_string(pass), done, total);
+        });
+        const MCStatus status = algorithm.BuildModel(records, nullptr);
+        interrupt.SetTarget(nullptr);
+        progress.Clear();
+
+        if (!records.GetError().empty()) {
+            err << "mcsim: " << records.GetError() << "\n";
+            return 1;
+        }
+        if (status.GetErrorCode() == MCCommon_800::kCancelledCode || interrupt.IsCancelled()) {
+            err << "mcsim: fit cancelled during data pass " << records.GetPassCount() << " after "
+                << records.GetRecordsRead() << " rows; nothing was fitted or written\n";
+            return 130;
+        }
+        // Listwise deletion can leave nothing; say so rather than pass on the step's code.
+        if (algorithm.GetNRecords() > 0 && algorithm.GetNValidRecords() == 0) {
+            err << "mcsim: "
+                << LocatedMessage(
+                       path, 0,
+                       "no row has a value in every fitted field" +
+                           std::string(options.fWeight.empty() ? "" : " and a positive weight"))
+                << "\n";
+            return 1;
+        }
+
+        if (status.IsError()) {
+            err << "mcsim: the fitting failed: " << StatusText(status) << " (code "
+                << status.GetErrorCode() << ")\n";
+            return 1;
+        }
+        DFCOutputStats* results = nullptr;
+        if (algorithm.GetOutputStats(results).IsError() || !results) {
+            err << "mcsim: the fitting produced no results\n";
+            return 1;
+        }
+        out << "fitted " << fields.size() << (fields.size() == 1 ? " field" : " fields") << " of "
+            << path << ": " << algorithm.GetNRecords() << " rows read, "
+            << algorithm.GetNValidRecords() << " used";
+        if (algorithm.GetNInvalidRecords() > 0) {
+            out << ", " << algorithm.GetNInvalidRecords()
+                << " left out (a missing value in a fitted field"
+                << (options.fWeight.empty() ? "" : " or no positive weight") << ")";
+        }
+        if (!options.fWeight.empty()) {
+            out << "; total weight " << Num(algorithm.GetValidWeight());
+        }
+        out << "\n";
+
+        const auto& covInfo = settings.GetCovariateInfoElems();
+        const auto& covariates = results->GetCovarDistInfo();
+        for (std::size_t i = 0; i < covariates.size(); ++i) {
+            const int index = settings.GetCovariates()[i];
+            PrintCovariate(out, covariates[i], covInfo[i],
+                           dict.GetFields()[static_cast<std::size_t>(index)], settings.GetGFType());
+        }
+        for (const auto& info : results->GetFactorDistInfo()) {
+            PrintFactor(out, info);
+        }
+        PrintCorrelations(out, *results);
+        PrintCrosstabs(out, *results);
+        PrintWarnings(out, algorithm.GetWarnings());
+
+        MCMCSP_800::MCPlanXMLHandler handler;
+        std::string error;
+        if (!options.fPlanPath.empty()) {
+            const SPCSettings plan = BuildPlan(options, dict, fields, *results, model.get(), err);
+            std::string xml;
+            if (!handler.WritePlanFile(xml, &plan)) {
+                throw HostError(
+                    LocatedMessage(options.fPlanPath, 0, "the plan could not be turned into XML"));
+            }
+            if (!WriteFileAtomically(options.fPlanPath, xml, error)) {
+                throw HostError(error);
+            }
+            out << "\nplan written to " << options.fPlanPath << "\n";
+        }
+        if (!options.fFitStatsPath.empty()) {
+            std::string xml;
+            if (!handler.WriteFittingOutStats(xml, results)) {
+                throw HostError(LocatedMessage(options.fFitStatsPath, 0,
+                                               "the fitting statistics could not be turned "
+                                               "into XML"));
+            }
+            if (!WriteFileAtomically(options.fFitStatsPath, xml, error)) {
+                throw HostError(error);
+            }
+            out << "fitting statistics written to " << options.fFitStatsPath << "\n";
+        }
+        return 0;
+    } catch (const ReadCancelled&) {
+        progress.Clear();
+        err << "mcsim: cancelled while reading " << options.fDataPath
+            << "; nothing was fitted or written\n";
+        return 130;
+    } catch (const HostError& e) {
+        progress.Clear();
+        err << "mcsim: " << e.what() << "\n";
+        return 1;
+    } catch (const std::bad_alloc&) {
+        progress.Clear();
+        err << "mcsim: out of memory\n";
+        return 1;
+    } catch (const std::exception& e) {
+        progress.Clear();
+        err << "mcsim: " << e.what() << "\n";
+        return 1;
+    }
+}
+
+} // namespace MCHost

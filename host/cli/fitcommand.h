@@ -1,0 +1,47 @@
+// `mcsim fit DATA.csv`: fits distributions to the fields of a CSV file with the component's
+// distribution fitting (DFCAlgorithm) and prints, per field, the candidates with their
+// parameters and whatever goodness-of-fit statistics and best fit the results hold, then the
+// correlations, the contingency table and the warnings. With -o it writes the simulation plan
+// (every fitted field an autofit input completed with its best distribution, the fitted
+// correlations and contingency table, the model file and its targets); with --fit-stats the
+// fitting statistics document. Files are written to a temporary name and renamed when whole.
+#pragma once
+
+#include <CLI/CLI.hpp>
+
+#include <ostream>
+#include <string>
+#include <vector>
+
+namespace MCHost {
+
+//! What the command line says about one fitting run.
+struct FitOptions {
+    std::string fDataPath;              //!< the CSV file
+    std::vector<std::string> fvFields;  //!< fields to fit; empty: all but the weight
+    std::vector<std::string> fvFactors; //!< fields fitted as categorical factors
+    std::string fWeight;                //!< frequency weight field, "" none
+    std::vector<std::string> fvLevels;  //!< NAME=LEVEL overrides
+    std::string fTest = "ad";           //!< ad, ks or both
+    bool fbCrosstabs = false;           //!< joint table of the categorical fields
+    int fCases = 0;                     //!< rows to use, 0 all
+    int fBins = 100;                    //!< histogram bins
+    int fThreads = 0;                   //!< worker threads, 0 one per processor
+    std::string fDelimiter = ",";       //!< field separator ("tab" for a tab)
+    int fMaxOrdinalValues = 20;         //!< ordinal inference threshold
+    bool fbProgress = true;             //!< progress bar when stderr is a terminal
+    std::string fPlanPath;              //!< -o: the plan file to write, "" none
+    std::string fFitStatsPath;          //!< --fit-stats: the statistics document, "" none
+    std::string fModelPath;             //!< --model: the formula model to record
+    std::vector<std::string> fvTargets; //!< --targets: the model targets to record
+    std::vector<std::string> fvFixed;   //!< --fixed NAME=VALUE: fixed inputs of the plan
+};
+
+//! Adds the `fit` subcommand to `app`, storing into `options`; returns it.
+CLI::App* AddFitCommand(CLI::App& app, FitOptions& options);
+
+//! Runs the fit. Results go to `out`, messages to `err`. Returns the exit status: 0 done,
+//! 1 failed (the message names the file, line or field), 130 cancelled.
+int RunFit(const FitOptions& options, std::ostream& out, std::ostream& err);
+
+} // namespace MCHost

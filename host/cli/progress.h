@@ -1,0 +1,33 @@
+// A one-line progress bar on standard error for the long steps of the command (reading the
+// data file, the passes of the fitting). It draws only when standard error is a terminal, so
+// redirected output and logs stay clean.
+#pragma once
+
+#include <cstdint>
+#include <string>
+
+namespace MCHost {
+
+class ProgressBar {
+public:
+    //! A bar that draws when `enabled` and standard error is a terminal.
+    explicit ProgressBar(bool enabled = true);
+    ~ProgressBar();
+    ProgressBar(const ProgressBar&) = delete;
+    ProgressBar& operator=(const ProgressBar&) = delete;
+
+    //! Shows `label` with `done` of `total` (bytes, records); redraws only when the shown
+    //! percentage or the label changes.
+    void Show(const std::string& label, std::uint64_t done, std::uint64_t total);
+    //! Clears the line.
+    void Clear();
+    bool IsActive() const { return fbActive; }
+
+private:
+    bool fbActive;          //!< drawing on a terminal
+    bool fbShown = false;   //!< a bar is on the line
+    int fLastPercent = -1;  //!< percentage last drawn
+    std::string fLastLabel; //!< label last drawn
+};
+
+} // namespace MCHost

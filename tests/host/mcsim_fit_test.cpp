@@ -1,0 +1,284 @@
+// End-to-end runs of `mcsim fit` through the built command on the bundled example data and on
+// broken inputs: exit status, what reaches standard output, and the one-line messages.
+#include "hosttestfiles.h"
+
+#include "data/csvreader.h"
+#include "mctolerance.h"
+#include "simulation_common/mcplanxmlhandler.h"
+#include "simulation_common/spcsettings.h"
+
+#include <gtest/gtest.h>
+
+#include <algorithm>
+#include <cstdio>
+#include <filesystem>
+#include <map>
+#include <sstream>
+#include <sys/wait.h>
+
+#ifndef MCSIM_EXE
+#error "MCSIM_EXE (the path of the mcsim command) is set by host/CMakeLists.txt"
+#endif
+
+namespace {
+
+const std::string kSales = std::string(MCSIM_EXAMPLES_DIR) + "/data/sales.csv";
+
+struct CommandRun {
+    int status = -1; //!< exit status
+    std::string out; //!< standard output
+    std::string err; //!< standard error
+};
+
+std::string Quote(const std::string& s) {
+    std::string q = "'";
+    for (char c : s) {
+        q += (c == '\'') ? std::string("'\\''") : std::string(1, c);
+    }
+    return q + "'";
+}
+
+//! Runs mcsim with `args`, standard error to a file of `dir`.
+CommandRun Mcsim(const std::vector<std::string>& args, const hosttest::TempDir& dir) {
+    std::string command = Quote(MCSIM_EXE);
+    for (const std::string& a : args) {
+        command += " " + Quote(a);
+    }
+    const std::string errPath = dir.File("stderr.txt");
+    command += " 2>" + Quote(errPath) + " </dev/null";
+    CommandRun run;
+    FILE* pipe = ::popen(command.c_str(), "r");
+    if (!pipe) {
+        return run;
+    }
+    char buffer[4096];
+    std::size_t n = 0;
+    while ((n = std::fread(buffer, 1, sizeof buffer, pipe)) > 0) {
+        run.out.append(buffer, n);
+    }
+    const int raw = ::pclose(pipe);
+    run.status = WIFEXITED(raw) ? WEXITSTATUS(raw) : -1;
+    run.err = hosttest::ReadFile(errPath);
+    return run;
+}
+
+//! The lines of `text` from the one starting with `first` up to the next empty line.
+std::vector<std::string> Block(const std::string& text, const std::string& first) {
+    std::istringstream in(text);
+    std::vector<std::string> lines;
+    std::string line;
+    bool inside = false;
+    while (std::getline(in, line)) {
+        if (!inside && line.rfind(first, 0) == 0) {
+            inside = true;
+        }
+        if (inside) {
+            if (line.empty()) {
+                break;
+            }
+            lines.push_back(line);
+        }
+    }
+    return lines;
+}
+
+TEST(McsimFit, FitsTheExampleData) {
+    hosttest::TempDir dir;
+    const CommandRun run = Mcsim({"fit", kSales, "--crosstabs", "--threads", "2"}, dir);
+    ASSERT_EQ(run.status, 0) << run.err;
+    // Standard error is not a terminal here: no progress bar, no noise.
+    EXPECT_EQ(run.err, "");
+    for (const char* header :
+         {"unit_price  (continuous)", "unit_cost  (continuous)", "volume  (continuous)",
+          "returns  (ordinal", "satisfaction  (ordinal", "region  (categorical",
+          "channel  (categorical", "store  (categorical", "correlations",
+          "contingency table of the categorical fields"}) {
+        EXPECT_NE(run.out.find(std::string("\n") + header), std::string::npos) << header;
+    }
+
+    // An independent count of the rows every fitted field has a value in, and of the regions
+    // among them: the fitted categorical distribution must be these shares.
+    std::istringstream in(hosttest::ReadFile(kSales));
+    MCHost::CsvReader reader(in, kSales);
+    std::vector<std::string> cells;
+    ASSERT_TRUE(reader.ReadRecord(cells));
+    int rows = 0;
+    int valid = 0;
+    std::map<std::string, int> regions;
+    while (reader.ReadRecord(cells)) {
+        ++rows;
+        bool complete = true;
+        for (const std::string& c : cells) {
+            complete = complete && !(c.empty() || c == "NA" || c == ".");
+        }
+        if (complete) {
+            ++valid;
+            ++regions[cells[0]];
+        }
+    }
+    EXPECT_NE(run.out.find(std::to_string(rows) + " rows read, " + std::to_string(valid) + " used"),
+              std::string::npos)
+        << run.out.substr(0, 200);
+    const std::vector<std::string> block = Block(run.out, "region  (categorical");
+    ASSERT_EQ(block.size(), 2 + regions.size());
+    for (std::size_t i = 2; i < block.size(); ++i) {
+        std::istringstream line(block[i]);
+        std::string label;
+        double share = 0.0;
+        line >> label >> share;
+        ASSERT_EQ(regions.count(label), 1u) << block[i];
+        // Six significant digits are printed.
+        EXPECT_NEAR_REL(share, regions[label] / double(valid), 1e-5) << label;
+    }
+}
+
+TEST(McsimFit, SameRunSameOutput) {
+    hosttest::TempDir dir;
+    const std::vector<std::string> args = {"fit", kSales, "--threads", "3", "--test", "both"};
+    const CommandRun first = Mcsim(args, dir);
+    const CommandRun second = Mcsim(args, dir);
+    ASSERT_EQ(first.status, 0) << first.err;
+    EXPECT_EQ(first.out, second.out);
+}
+
+TEST(McsimFit, WeightLevelsAndFieldChoice) {
+    hosttest::TempDir dir;
+    const CommandRun run =
+        Mcsim({"fit", kSales, "--fields", "unit_price,returns", "--weight", "satisfaction",
+               "--level", "returns=continuous", "--cases", "100"},
+              dir);
+    ASSERT_EQ(run.status, 0) << run.err;
+    EXPECT_NE(run.out.find("fitted 2 fields"), std::string::npos) << run.out;
+    EXPECT_NE(run.out.find("100 rows read"), std::string::npos) << run.out;
+    EXPECT_NE(run.out.find("total weight"), std::string::npos) << run.out;
+    EXPECT_NE(run.out.find("\nreturns  (continuous)"), std::string::npos) << run.out;
+    EXPECT_EQ(run.out.find("\nregion"), std::string::npos) << run.out;
+}
+
+TEST(McsimFit, HelpForTheCommandAndTheSubcommand) {
+    hosttest::TempDir dir;
+    const CommandRun top = Mcsim({"--help"}, dir);
+    EXPECT_EQ(top.status, 0);
+    EXPECT_NE(top.out.find("fit"), std::string::npos);
+    const CommandRun fit = Mcsim({"fit", "--help"}, dir);
+    EXPECT_EQ(fit.status, 0);
+    for (const char* option : {"--fields", "--factors", "--weight", "--level", "--test",
+                               "--crosstabs", "--cases", "--bins", "--threads"}) {
+        EXPECT_NE(fit.out.find(option), std::string::npos) << option;
+    }
+}
+
+struct BadRun {
+    const char* name;
+    std::string data;                 //!< content of the data file ("" : the example file)
+    std::vector<std::string> options; //!< after `fit FILE`
+    const char* what;                 //!< words of the message on standard error
+    std::string model = "";           //!< a model file to record in a plan, "" none
+};
+
+class McsimFitErrors : public ::testing::TestWithParam<BadRun> {};
+
+TEST_P(McsimFitErrors, OneMessageAndFailure) {
+    const BadRun& c = GetParam();
+    hosttest::TempDir dir;
+    const std::string path = c.data.empty() ? kSales : dir.Write("in.csv", c.data);
+    std::vector<std::string> args = {"fit", path};
+    args.insert(args.end(), c.options.begin(), c.options.end());
+    if (!c.model.empty()) {
+        args.insert(args.end(),
+                    {"-o", dir.File("plan.xml"), "--model", dir.Write("m.model", c.model)});
+    }
+    const CommandRun run = Mcsim(args, dir);
+    EXPECT_EQ(run.status, 1) << run.out;
+    EXPECT_EQ(run.out, "");
+    EXPECT_FALSE(std::filesystem::exists(dir.File("plan.xml")));
+    EXPECT_EQ(run.err.rfind("mcsim: ", 0), 0u) << run.err;
+    EXPECT_NE(run.err.find(c.what), std::string::npos) << run.err;
+    EXPECT_EQ(std::count(run.err.begin(), run.err.end(), '\n'), 1) << run.err;
+}
+
+INSTANTIATE_TEST_SUITE_P(
+    Inputs, McsimFitErrors,
+    ::testing::Values(
+        BadRun{"MalformedRow", "a,b\n1,2\n3\n", {}, "in.csv:3: the row has 1 fields"},
+        BadRun{"UnterminatedQuote", "a,b\n1,\"2\n", {}, "in.csv:2: a quoted field is not closed"},
+        BadRun{"HeaderOnly", "a,b\n", {}, "no data rows"},
+        BadRun{"UnknownField", "", {"--fields", "unit_price,nope"}, "unknown field 'nope'"},
+        BadRun{"TextWeight", "", {"--weight", "region"}, "holds text"},
+        BadRun{"CategoricalWeight",
+               "",
+               {"--weight", "returns", "--level", "returns=categorical"},
+               "is categorical"},
+        BadRun{"TextAsContinuous", "", {"--level", "store=continuous"}, "can only be categorical"},
+        BadRun{"BadLevel", "", {"--level", "store=fuzzy"}, "--level store=fuzzy"},
+        BadRun{"WeightFitted",
+               "",
+               {"--fields", "unit_price", "--factors", "region", "--weight", "region"},
+               "frequency weight"},
+        BadRun{"NoValidRow", "a,b\n1,NA\nNA,2\n", {}, "no row has a value in every fitted field"},
+        BadRun{"ModelSyntax", "", {}, "m.model:2: syntax error", "a = unit_price\nb = a +\n"},
+        BadRun{"ModelUnknownName",
+               "",
+               {},
+               "m.model:1: unknown name 'unit_prise'",
+               "a = unit_prise * 2\n"},
+        BadRun{"ModelUnknownTarget",
+               "",
+               {"--targets", "zz"},
+               "does not define",
+               "a = unit_price * 2\n"},
+        BadRun{"ModelWithoutPlan", "", {"--model", "m.model"}, "add -o PLAN.xml"}),
+    [](const auto& p) { return std::string(p.param.name); });
+
+TEST(McsimFit, WritesAPlanThatReadsBack) {
+    hosttest::TempDir dir;
+    const std::string plan = dir.File("plan.xml");
+    const std::string stats = dir.File("fit.xml");
+    const CommandRun run =
+        Mcsim({"fit", kSales, "--crosstabs", "-o", plan, "--fit-stats", stats, "--model",
+               std::string(MCSIM_EXAMPLES_DIR) + "/models/profit.model", "--targets",
+               "profit,margin_band"},
+              dir);
+    ASSERT_EQ(run.status, 0) << run.err;
+    // Only the two files: no temporary file is left beside them.
+    EXPECT_EQ(dir.Count(), 3u); // plan, statistics and the captured standard error
+
+    MCMCSP_800::SPCSettings read;
+    MCMCSP_800::SPCSettings* pRead = &read;
+    MCMCSP_800::MCPlanXMLHandler handler;
+    ASSERT_TRUE(handler.ParsePlanFile(hosttest::ReadFile(plan), pRead));
+    ASSERT_EQ(read.GetSimulationInput().size(), 8u);
+    for (const auto& input : read.GetSimulationInput()) {
+        EXPECT_EQ(input.GetDistElementSize(), 1u) << input.GetVarName();
+    }
+    const auto* region = read.GetSimInput("region");
+    ASSERT_NE(region, nullptr);
+    EXPECT_EQ(region->GetFinalDistType(), MCSPConst::kDistCategorical);
+    std::vector<MCMCSP_800::SPCSettings::ModelFileTarget> targets;
+    read.GetModelTargets(targets);
+    ASSERT_EQ(targets.size(), 2u);
+    EXPECT_EQ(targets[0].fName, "profit");
+    EXPECT_EQ(targets[1].fMeasurementLevel, MCSPConst::kLevelCategorical);
+    // The model is recorded relative to the plan's folder.
+    EXPECT_TRUE(std::filesystem::exists(std::filesystem::path(dir.Path()) / read.GetModelFile()))
+        << read.GetModelFile();
+    EXPECT_EQ(read.GetCrstabsFactors(), (std::vector<std::string>{"region", "channel", "store"}));
+    EXPECT_NE(hosttest::ReadFile(stats).find("<FitStats"), std::string::npos);
+}
+
+TEST(McsimFit, UnwritablePlanIsReported) {
+    hosttest::TempDir dir;
+    const CommandRun run = Mcsim({"fit", kSales, "-o", "/no/such/folder/plan.xml"}, dir);
+    EXPECT_EQ(run.status, 1);
+    EXPECT_NE(run.err.find("/no/such/folder/plan.xml: cannot create"), std::string::npos)
+        << run.err;
+}
+
+TEST(McsimFit, MissingFileIsNamed) {
+    hosttest::TempDir dir;
+    const CommandRun run = Mcsim({"fit", dir.File("absent.csv")}, dir);
+    EXPECT_EQ(run.status, 1);
+    EXPECT_NE(run.err.find("absent.csv: cannot open the data file"), std::string::npos) << run.err;
+}
+
+} // namespace
