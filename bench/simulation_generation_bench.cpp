@@ -1,0 +1,204 @@
+// Throughput of the simulation's input generation on the W-SIM-1 input set: six correlated
+// continuous inputs (Normal(100, 15), LogNormal(a = e, b = 0.5), Triangular(1, 10, 4),
+// Uniform(0, 1), Gamma(shape 2, rate 0.5), Beta(2, 5)) and one categorical input with three
+// categories. One case is one correlated normal vector (one triangular multiply), six
+// transforms (two prepared quantiles) and one categorical draw, with truncation by rejection.
+//
+//   BM_DrawCase                  cases per second of one simulator (items_per_second)
+//   BM_DrawCase_Truncated        the same with bounds that reject about a third of the attempts
+//   BM_CaseWorkers/threads:n     cases per second of n case workers on the standard thread
+//                                factory (wall clock)
+//   BM_CorrelationModel/n        the NORTA model of the 15 pairs on n threads (wall clock)
+//   BM_Transform/<type>          one transform z → value of a single input
+#include "simulation_common/spcsettings.h"
+#include "simulation_evaluation/secgeneration.h"
+#include "simulation_evaluation/secsettings.h"
+#include "simulation_evaluation/secsimulator.h"
+
+#include "mcmath/mcrandom.h"
+#include "mcthread/mcthread.h"
+
+#include <benchmark/benchmark.h>
+
+#include <cmath>
+#include <memory>
+#include <string>
+#include <utility>
+#include <vector>
+
+namespace {
+
+using namespace MCMCSP_800;
+using namespace MCSPConst;
+
+//! Settings, plan and variables of the W-SIM-1 input set; simulators borrow all three.
+struct WSim1 {
+    SECSettings settings;
+    SPCSettings plan;
+    MCXML_800::MCVarList vars;
+    MCThread_800::MCStdThreadFactory factory;
+
+    explicit WSim1(bool truncated = false, int threads = 1) {
+        settings.SetThreadFactory(&factory);
+        settings.SetMaxThreadNum(threads);
+        Add("normal", kDistNormal, {{"mean", 100.0}, {"stddev", 15.0}});
+        Add("lognormal", kDistLognormal, {{"a", std::exp(1.0)}, {"b", 0.5}});
+        Add("triangular", kDistTriangular, {{"min", 1.0}, {"max", 10.0}, {"mode", 4.0}});
+        Add("uniform", kDistUniform, {{"min", 0.0}, {"max", 1.0}});
+        Add("gamma", kDistGamma, {{"shape", 2.0}, {"scale", 0.5}});
+        Add("beta", kDistBeta, {{"shape1", 2.0}, {"shape2", 5.0}});
+        SimInputSpecs region(true);
+        region.SetVarName("region");
+        region.SetVarLevel(kLevelCategorical);
+        region.SetString(true);
+        const int d = region.AddDistribution(kDistCategorical);
+        DistInfoElem* dist = region.GetDistribution(static_cast<std::size_t>(d));
+        dist->AddParameter("cats", std::vector<std::string>{"north", "south", "west"});
+        dist->AddParameter("probs", std::vector<double>{0.5, 0.3, 0.2});
+        vars.Add(std::make_unique<MCXML_800::MCCatVar>(
+            "region",
+            MCXML_800::MCCatNumEncoder(std::vector<std::string>{"north", "south", "west"})));
+        plan.AddSimulationInput(region);
+
+        const char* names[] = {"normal", "lognormal", "triangular", "uniform", "gamma", "beta"};
+        const double corr[6][6] = {
+            {1.0, 0.5, 0.3, 0.2, -0.2, 0.1}, {0.5, 1.0, 0.3, 0.1, 0.4, 0.2},
+            {0.3, 0.3, 1.0, 0.0, 0.2, -0.1}, {0.2, 0.1, 0.0, 1.0, 0.3, 0.3},
+            {-0.2, 0.4, 0.2, 0.3, 1.0, 0.0}, {0.1, 0.2, -0.1, 0.3, 0.0, 1.0}};
+        for (int i = 0; i < 6; ++i) {
+            for (int j = 0; j <= i; ++j) {
+                plan.SetCorrMatrixCell(names[i], names[j], corr[i][j]);
+            }
+        }
+        if (truncated) {
+            plan.GetSimInput("normal")->SetMinimum(85.0);
+            plan.GetSimInput("gamma")->SetMaximum(8.0);
+            plan.GetSimInput("beta")->SetMaximum(0.5);
+        }
+    }
+
+    void Add(const std::string& name, DistType type,
+             const std::vector<std::pair<std::string, double>>& params) {
+        SimInputSpecs input(true);
+        input.SetVarName(name);
+        input.SetVarLevel(kLevelContinuous);
+        DistInfoElem* dist =
+            input.GetDistribution(static_cast<std::size_t>(input.AddDistribution(type)));
+        for (const auto& [label, value] : params) {
+            dist->AddParameter(label, value);
+        }
+        vars.Add(std::make_unique<MCXML_800::MCScaleVar>(name));
+        plan.AddSimulationInput(input);
+    }
+
+    //! A master with its correlation model and generation prepared.
+    std::unique_ptr<SECSimulator> Master() const {
+        auto sim =
+            std::make_unique<SECSimulator>(&settings, &plan, &vars, 0, nullptr, -1.0, nullptr);
+        if (!sim->PrepareGeneration().IsOK()) {
+            return nullptr;
+        }
+        return sim;
+    }
+};
+
+void DrawCases(benchmark::State& state, bool truncated) {
+    const WSim1 w(truncated);
+    auto sim = w.Master();
+    if (!sim) {
+        state.SkipWithError("preparation failed");
+        return;
+    }
+    long long rejections = 0;
+    for (auto _ : state) {
+        if (!sim->DrawCase().IsOK()) {
+            state.SkipWithError("case failed");
+            break;
+        }
+        rejections += sim->GetLastRejections();
+        benchmark::DoNotOptimize(sim->GetCaseValues().data());
+    }
+    state.SetItemsProcessed(state.iterations());
+    state.counters["rejected_per_case"] =
+        static_cast<double>(rejections) / static_cast<double>(state.iterations());
+}
+
+void BM_DrawCase(benchmark::State& state) {
+    DrawCases(state, false);
+}
+BENCHMARK(BM_DrawCase);
+
+void BM_DrawCase_Truncated(benchmark::State& state) {
+    DrawCases(state, true);
+}
+BENCHMARK(BM_DrawCase_Truncated);
+
+//! Case workers of one master, each drawing its quota on its own thread.
+void BM_CaseWorkers(benchmark::State& state) {
+    const int threads = static_cast<int>(state.range(0));
+    constexpr int kCasesPerWorker = 200000;
+    WSim1 w(false, threads);
+    auto master = w.Master();
+    if (!master) {
+        state.SkipWithError("preparation failed");
+        return;
+    }
+    for (auto _ : state) {
+        std::vector<std::unique_ptr<SECSimulator>> workers;
+        std::vector<MCThread_800::IMCThreadTask*> tasks;
+        for (int t = 0; t < threads; ++t) {
+            workers.push_back(master->CreateWorker(master->GetStream()->GetRandom()));
+            workers.back()->SetCaseQuota(kCasesPerWorker);
+            tasks.push_back(workers.back().get());
+        }
+        w.factory.CreateThreadGroup(threads)->Run(tasks);
+    }
+    state.SetItemsProcessed(state.iterations() * threads * kCasesPerWorker);
+}
+BENCHMARK(BM_CaseWorkers)->Arg(1)->Arg(2)->UseRealTime()->Unit(benchmark::kMillisecond);
+
+void BM_CorrelationModel(benchmark::State& state) {
+    const WSim1 w(false, static_cast<int>(state.range(0)));
+    for (auto _ : state) {
+        SECSimulator sim(&w.settings, &w.plan, &w.vars, 0, nullptr, -1.0, nullptr);
+        if (!sim.PrepareCorrelationModel().IsOK()) {
+            state.SkipWithError("correlation model failed");
+            break;
+        }
+        benchmark::DoNotOptimize(sim.GetNormalCorrelations().GetElem(1, 0));
+    }
+}
+BENCHMARK(BM_CorrelationModel)->Arg(1)->Arg(2)->UseRealTime()->Unit(benchmark::kMillisecond);
+
+void BM_Transform(benchmark::State& state, DistType type, std::vector<double> params) {
+    SECInputGenerator gen;
+    if (!SECPrepareGenerator(type, params, gen)) {
+        state.SkipWithError("bad parameters");
+        return;
+    }
+    constexpr std::size_t kPool = 4096;
+    MCMath_800::MCURandom stream(20240601u);
+    MCMath_800::MCRandomValues normal;
+    normal.SetURNGPtr(&stream);
+    (void)normal.SetParamNormal();
+    std::vector<double> zs(kPool);
+    for (double& z : zs) {
+        z = normal.GetRandom();
+    }
+    std::size_t i = 0;
+    for (auto _ : state) {
+        benchmark::DoNotOptimize(SECTransform(gen, zs[i++ & (kPool - 1)]));
+    }
+}
+BENCHMARK_CAPTURE(BM_Transform, Normal, kDistNormal, {100.0, 15.0});
+BENCHMARK_CAPTURE(BM_Transform, LogNormal, kDistLognormal, {std::exp(1.0), 0.5});
+BENCHMARK_CAPTURE(BM_Transform, Triangular, kDistTriangular, {1.0, 10.0, 4.0});
+BENCHMARK_CAPTURE(BM_Transform, Uniform, kDistUniform, {0.0, 1.0});
+BENCHMARK_CAPTURE(BM_Transform, Gamma, kDistGamma, {2.0, 0.5});
+BENCHMARK_CAPTURE(BM_Transform, Beta, kDistBeta, {2.0, 5.0});
+BENCHMARK_CAPTURE(BM_Transform, Poisson, kDistPoisson, {4.0});
+BENCHMARK_CAPTURE(BM_Transform, NegBin, kDistNegbinomial, {3.0, 0.4, 0.0});
+
+} // namespace
+
+BENCHMARK_MAIN();
