@@ -229,7 +229,8 @@ DFCSettings AnesSettings(MCThread_800::IMCThreadFactory* factory, int maxThreads
 }
 
 bool SameBits(const std::vector<double>& a, const std::vector<double>& b) {
-    return a.size() == b.size() && std::memcmp(a.data(), b.data(), a.size() * sizeof(double)) == 0;
+    return a.size() == b.size() &&
+           (a.empty() || std::memcmp(a.data(), b.data(), a.size() * sizeof(double)) == 0);
 }
 
 TEST(OptimisationThreads, ResultsDoNotDependOnTheThreadCount) {
