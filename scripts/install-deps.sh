@@ -18,6 +18,8 @@ packages=(
     libnlopt-cxx-dev
     libcli11-dev
     libmuparser-dev
+    nlohmann-json3-dev
+    clang
 )
 
 missing=()

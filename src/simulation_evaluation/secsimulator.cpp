@@ -368,6 +368,8 @@ std::unique_ptr<SECSimulator> SECSimulator::CreateWorker(double seedValue) const
     worker->fbCorrModelPrepared = fbCorrModelPrepared;
     worker->fbCorrelationFailed = fbCorrelationFailed;
     worker->fCorrModelStatus = fCorrModelStatus;
+    worker->fCiZ = fCiZ;
+    worker->fpTemplate = this;
     return worker;
 }
 
@@ -410,27 +412,6 @@ MCStatus SECSimulator::RunNortaPairs() {
         // combination gives this one a fallback value.
         pair.fNormalCorr = result.fNormalCorr;
         pair.fbComputed = true;
-    }
-    return MCStatus();
-}
-
-MCStatus SECSimulator::RunCaseLoop() {
-    const MCStatus prepared = PrepareGeneration();
-    if (prepared.IsError()) {
-        return prepared;
-    }
-    while (fSimCaseCount < fCaseQuota && !fpCancel->WillCancel()) {
-        const MCStatus status = DrawCase();
-        if (status.GetErrorCode() == MCSPStatus::kAttemptsExhausted) {
-            return status;
-        }
-        ++fSimCaseCount;
-        fFilteredCaseCount += fLastRejections;
-        if (status.IsError()) {
-            ++fInvalidCaseCount;
-        } else {
-            ++fValidCaseCount;
-        }
     }
     return MCStatus();
 }

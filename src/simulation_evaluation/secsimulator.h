@@ -25,11 +25,24 @@
 // contingency factor) as a number. Drawing allocates nothing: the working vectors are sized
 // when the generation is prepared.
 //
+// Scoring and statistics (secscoring.cpp): StartScoring lays out the input record (simulated
+// inputs, then fixed inputs) and the score computer's output record; the target set-up
+// (ProcessTargetInfo with a score computer, PrepareTargetInfo from the plan for the host-driven
+// way) decides which values of a score are targets, their filters, chart budget and stop
+// criterion. A case is accepted when its inputs lie inside their truncation bounds and its
+// targets are present and inside their filters; an accepted case is accumulated into the
+// simulator's results (SECOutputStats), the means and cross products and the contingency cell
+// counts. The master merges its workers' statistics in thread order and completes the results.
+// The sensitivity measures (secsensitivity.cpp) re-score variants of each accepted case.
+//
 // Threads: a simulator is used by one thread at a time. The NORTA workers and the case workers
 // share nothing but the read-only settings, plan and variable list and the cancel record.
 #pragma once
 
+#include "mccommon/hostinterfaces.h"
 #include "mccommon/mcstatus.h"
+#include "mccommon/records.h"
+#include "mccommon/scoring.h"
 #include "mccommon/variables.h"
 #include "mcmath/mccancelinfo.h"
 #include "mcmath/mcrandom.h"
@@ -41,6 +54,7 @@
 #include "simulation_evaluation/secoutputstats.h"
 #include "simulation_evaluation/secsettings.h"
 
+#include <atomic>
 #include <cstdint>
 #include <memory>
 #include <string>
@@ -151,6 +165,118 @@ public:
     //! inputs (filled with 0.0) when its size differs; missing values on failure.
     MCCommon_800::MCStatus SimulatePredictors(std::vector<double>& values);
 
+
+    // ---- Scoring and targets -----------------------------------------------------------
+
+    //! One target: where its value is read from a score, its filter and its chart range.
+    struct Target {
+        std::string fName;                               //!< target name
+        const MCXML_800::IMCVariable* fpVariable = nullptr; //!< host's variable; may be null
+        bool fbCategorical = false;   //!< measurement kind 2 or 3 (or a cluster identifier)
+        int fListIndex = -1;          //!< position among the continuous or categorical targets
+        int fValuePos = -1;           //!< position of its value among the values of a score
+        int fNProbs = 0;              //!< category probabilities following the value
+        std::vector<std::string> fvLabels; //!< category labels (categorical targets)
+        bool fbHasFilter = false;     //!< the plan gives it a filter range
+        double fFilterLow = 0.0;      //!< lower filter bound; lowest double when open
+        double fFilterHigh = 0.0;     //!< upper filter bound; highest double when open
+        bool fbIncludeLow = true;     //!< the lower bound belongs to the range
+        bool fbIncludeHigh = true;    //!< the upper bound belongs to the range
+        double fChartMin = 0.0;       //!< chart range; missing while open
+        double fChartMax = 0.0;       //!< chart range; missing while open
+        bool fbScatter = false;       //!< gets scatter plots against the inputs for output
+    };
+
+    //! Resets the working values, computes the confidence interval's critical value from the
+    //! settings' level, and prepares the correlation model.
+    MCCommon_800::MCStatus PrepareForSimulation();
+    //! Obtains this simulator's score computer from `factory` and records its model type in the
+    //! results. Null `factory`: nothing happens.
+    MCCommon_800::MCStatus CreateScoreComputer(MCXML_800::IMCSPScoreFactory* factory);
+    //! PrepareGeneration, StartScoring and ProcessTargetInfo, as every simulator that scores
+    //! does before its first case.
+    MCCommon_800::MCStatus PrepareScoring();
+    //! The input and output records of the score computer.
+    MCCommon_800::MCStatus StartScoring();
+    //! Target set-up from the score computer (component-driven way).
+    MCCommon_800::MCStatus ProcessTargetInfo();
+    //! Target set-up from the plan's model targets (host-driven way): each record carries one
+    //! value per target, a categorical target followed by its category probabilities when the
+    //! settings' GetUseTargCatProbs is set. Also marks the open chart ranges for the start-up
+    //! range search.
+    MCCommon_800::MCStatus PrepareTargetInfo();
+    //! The pilot run: up to 2000 scored cases, stopping at 1000 valid ones, fixing the open
+    //! chart ranges; then the chart accumulators. 390011 below 1000 valid cases.
+    MCCommon_800::MCStatus RunPilot();
+    //! Scores the inputs `inputs` (one value per simulated input): fills the input record, calls
+    //! the score computer, reads the values of the score into GetScoreValues.
+    MCCommon_800::MCStatus ScoreInputs(const std::vector<double>& inputs);
+    //! One accepted case: drawn with truncation by rejection on the inputs and the target
+    //! filters (up to 1000 attempts, 390014), scored.
+    MCCommon_800::MCStatus DrawAndScoreCase();
+    //! Adds the current case (inputs, score values, contingency cell) to the statistics.
+    void AccumulateCase();
+    //! Pools the statistics of `workers` into this simulator's, in order. 390010 when the means
+    //! and cross products or a chart cannot be merged.
+    MCCommon_800::MCStatus
+    MergeStatsFromThreads(const std::vector<std::unique_ptr<SECSimulator>>& workers);
+    //! Completes the results: counts, target statistics, confidence intervals, correlations,
+    //! sensitivity measures, simulated correlations and cell shares. 390011 without a valid
+    //! case.
+    MCCommon_800::MCStatus CompleteStats();
+
+    //! Host-driven record `recordIndex` (0-based since PrepareEvaluation): the first 2000 fix
+    //! the chart ranges, later ones are accumulated.
+    MCCommon_800::MCStatus UpdateStatsForRecord(const std::vector<double>& predictors,
+                                                const std::vector<double>& targets,
+                                                int recordIndex);
+
+    //! The target names, in target order.
+    std::vector<std::string> GetTargetNames() const;
+    const std::vector<Target>& GetTargets() const { return fvTargets; }
+    //! Values read from a score per case.
+    int GetNValuesPerCase() const { return fNValuesPerCase; }
+    //! Category probabilities a score delivers per case.
+    int GetNProbabilities() const;
+    //! The score has a "prediction" or "clustering-clusterid" field.
+    bool HasPredictedField() const { return fPredictedIndex >= 0; }
+    bool HasCategoricalTarget() const;
+    //! The plan has a point-value or tails stop criterion on one of the targets.
+    bool HasStopCriterion() const {
+        return fStopPoint.fKind != StopKind::kNone || fStopTails.fKind != StopKind::kNone;
+    }
+    //! Values read from the last score.
+    const std::vector<double>& GetScoreValues() const { return fvScoreValues; }
+    //! Number of scores computed (each re-score of the sensitivity measures counts).
+    std::int64_t GetScoreCount() const { return fScoreCount; }
+    //! The contingency cell counts of the accumulated cases.
+    const std::vector<double>& GetCellCounts() const { return fvCellCounts; }
+    //! The means and cross products over the correlated inputs and the targets.
+    const MCMath_800::MCProvMeans& GetProvMeans() const { return fProvMeans; }
+    //! Critical value of the confidence interval of the means.
+    double GetCiZ() const { return fCiZ; }
+    //! The largest number of scatter plots this simulator fills.
+    int GetScatterBudget() const { return fScatterBudget; }
+    //! Chart range of simulated input `i`: its natural range, the pilot's range where open.
+    double GetInputChartMin(int i) const { return fvInputChartMin[static_cast<std::size_t>(i)]; }
+    double GetInputChartMax(int i) const { return fvInputChartMax[static_cast<std::size_t>(i)]; }
+
+    // ---- Case sink and progress ----------------------------------------------------------
+
+    //! Good cases go to `sink` (may be null): at once without `lock`, in batches of up to
+    //! 10000 under `lock` with one.
+    void SetSink(MCXML_800::SECAppDataProcess* sink, MCThread_800::IMCLock* lock);
+    //! Passes the buffered cases to the sink.
+    void FlushSink();
+    //! Reports a SECReporter with the cases simulated so far after every case.
+    void SetRecordProgressListener(MCCommon_800::ProgressListener* listener) {
+        fpRecordListener = listener;
+    }
+    //! A counter shared with the algorithm that the case loop advances as cases are simulated.
+    void SetProgressCounter(std::atomic<std::int64_t>* counter) { fpProgressCounter = counter; }
+    //! True when the case loop ended by a stop criterion.
+    bool IsStopped() const { return fbStopped; }
+
     // ---- Workers ------------------------------------------------------------------------
 
     //! A worker copy: a fresh simulator of the same settings, plan, variables and iteration,
@@ -249,6 +375,71 @@ private:
     //! The index of distribution or value this iteration uses among `count` of them.
     std::size_t IterationIndex(std::size_t count) const;
 
+
+    // ---- Scoring internals (secscoring.cpp) ----------------------------------------------
+
+    enum class StopKind { kNone, kPointValue, kTails };
+    //! The stop criterion of the run and its state.
+    struct StopState {
+        StopKind fKind = StopKind::kNone;
+        int fTarget = -1;          //!< index among the continuous targets
+        double fZ = 0.0;           //!< critical value of the criterion's level
+        double fThreshold = 0.0;   //!< point value: allowed half-width; tails: tail value
+        bool fbPercent = false;    //!< point value: threshold in percent of the mean
+        bool fbPercentile = false; //!< tails: percentile-type tail
+        bool fbUpper = true;       //!< tails: the upper tail
+        int fRequired = 0;         //!< tails: values required in the tail
+        int fTailCount = 0;        //!< tails: values counted in the tail
+        double fTailThreshold = 0.0; //!< tails: mean + h once active
+        double fTailHalfWidth = 0.0; //!< tails: h at activation
+        bool fbActive = false;     //!< tails: the criterion is active
+    };
+
+    //! Common part of the two target set-ups: filters, result records, scatter budget, stop
+    //! criteria, working tables.
+    MCCommon_800::MCStatus FinishTargetSetup();
+    //! Applies the plan's filter of the target named `target.fName`.
+    void ApplyTargetFilter(Target& target) const;
+    //! Scatter-plot budget of this iteration (and warning 390016).
+    void ApplyScatterBudget();
+    void SetupStopCriteria();
+    //! True when every target value in `values` is present and inside its filter.
+    bool AreTargetsAccepted(const std::vector<double>& values) const;
+    //! Reads the output record into fvScoreValues.
+    void ReadScore();
+    //! Sets the chart ranges that are still open from the pilot's or start-up statistics.
+    void FixChartRanges(const std::vector<MCMath_800::MCContStats>& inputStats,
+                        const std::vector<MCMath_800::MCContStats>& targetStats);
+    //! Feeds a valid pilot or start-up case to the range statistics.
+    void UpdateRangeStats(const std::vector<double>& inputs, const std::vector<double>& values,
+                          std::vector<MCMath_800::MCContStats>& inputStats,
+                          std::vector<MCMath_800::MCContStats>& targetStats) const;
+    //! The histograms and scatter plots of the results, over the chart ranges.
+    void CreateChartAccumulators();
+    //! Adds a case given by `inputs`, `values` and `cell` to the statistics.
+    void AccumulateValues(const std::vector<double>& inputs, const std::vector<double>& values,
+                          int cell, int rejections);
+    //! The stop check before each case of the case loop.
+    bool ShouldStop();
+    //! Hands the current good case to the sink.
+    void PassCaseToSink();
+    //! Copies the chart ranges of the master into this worker.
+    void CopyTemplatesFrom(const SECSimulator& master);
+    //! Tails criterion bookkeeping for one accumulated value of its target.
+    void UpdateTailCount(double value, const MCMath_800::MCContStats& stats);
+
+    // ---- Sensitivity measures (secsensitivity.cpp) --------------------------------------
+
+    //! Sizes the working tables of the sensitivity measures and the results' vectors.
+    void PrepareSensitivity();
+    //! The re-scored variants of the accepted current case (delta and variance measures).
+    MCCommon_800::MCStatus ComputeCaseSensitivity();
+    //! Adds the current case's differences and products to the statistics.
+    void AccumulateSensitivity();
+    //! Positive and negative deltas and variance contributions of every continuous target.
+    void CompleteSensitivity();
+    bool UsesSensitivity() const { return fbDeltaMeasure || fbVarianceMeasure; }
+
     //! The thread task of a NORTA worker.
     MCCommon_800::MCStatus RunNortaPairs();
     //! The thread task of a case worker.
@@ -300,6 +491,57 @@ private:
     int fFilteredCaseCount = 0; //!< rejected attempts
     int fValidCaseCount = 0;    //!< cases accepted
     int fInvalidCaseCount = 0;  //!< cases that failed
+
+
+    // Scoring and statistics.
+    std::unique_ptr<MCXML_800::IMCScoreComputer> fpScoreComputer; //!< this simulator's
+    MCXML_800::ValueRecord fInputRecord;  //!< simulated inputs, then fixed inputs
+    MCXML_800::ValueRecord fOutputRecord; //!< filled by the score computer
+    int fPredictedIndex = -1;             //!< "clustering-clusterid" or "prediction", or −1
+    int fProbIndex = -1;                  //!< "probcategory", or −1
+    int fNValuesPerCase = 0;              //!< values read from a score
+    bool fbHostDriven = false;            //!< targets from the plan (PrepareTargetInfo)
+    std::vector<Target> fvTargets;        //!< target order
+    std::vector<double> fvScoreValues;    //!< values of the last score
+    std::vector<double> fvCombined;       //!< correlated inputs, then targets
+    std::vector<double> fvInputChartMin;  //!< chart range per simulated input
+    std::vector<double> fvInputChartMax;
+    MCMath_800::MCProvMeans fProvMeans;   //!< means and cross products
+    std::vector<double> fvCellCounts;     //!< accumulated contingency cells
+    double fCiZ = 0.0;                    //!< critical value of the means' intervals
+    int fScatterBudget = 100;             //!< scatter plots this simulator fills at most
+    bool fbChartsReady = false;           //!< chart accumulators created
+    StopState fStopPoint;                 //!< point-value stop criterion
+    StopState fStopTails;                 //!< tails stop criterion
+    int fStartRecords = 0;                //!< host-driven records seen in the start-up
+    const SECSimulator* fpTemplate = nullptr; //!< the master of a worker (chart ranges)
+    std::vector<int> fvOutputInputs;      //!< simulated inputs marked for output
+    bool fbStopped = false;               //!< a stop criterion ended the case loop
+    std::int64_t fScoreCount = 0;         //!< scores computed
+    std::vector<MCMath_800::MCContStats> fvStartInputStats;  //!< host-driven range search
+    std::vector<MCMath_800::MCContStats> fvStartTargetStats; //!< host-driven range search
+    int fStartValid = 0;                  //!< valid start-up records
+
+    // Sink and progress.
+    MCXML_800::SECAppDataProcess* fpSink = nullptr; //!< host's, not owned
+    MCThread_800::IMCLock* fpLock = nullptr;        //!< host's, not owned
+    std::vector<double> fvSinkInputs;               //!< buffered cases' inputs
+    std::vector<double> fvSinkValues;               //!< buffered cases' score values
+    int fSinkCount = 0;                             //!< buffered cases
+    MCCommon_800::ProgressListener* fpRecordListener = nullptr; //!< host's, not owned
+    std::atomic<std::int64_t>* fpProgressCounter = nullptr;     //!< the algorithm's
+
+    // Sensitivity measures.
+    bool fbDeltaMeasure = false;    //!< UseTornadoStddev
+    bool fbVarianceMeasure = false; //!< TornadoVariance
+    std::vector<double> fvPosDiff;  //!< continuous target × covariate
+    std::vector<double> fvNegDiff;  //!< continuous target × covariate
+    std::vector<double> fvProducts; //!< continuous target × covariate
+    std::vector<double> fvSavedInputs; //!< the case's inputs
+    std::vector<double> fvSavedValues; //!< the case's score values
+    std::vector<double> fvWorkInputs;  //!< a variant of the case
+    std::vector<double> fvFurther;     //!< the further independent case
+    std::vector<int> fvContTargetPos;  //!< value position of each continuous target
 
     MCCommon_800::MCStatus fStatus;     //!< outcome of the last task or preparation
     MCCommon_800::MCWarnings fWarnings; //!< warnings (390015)

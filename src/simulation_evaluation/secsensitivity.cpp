@@ -1,0 +1,180 @@
+// SECSimulator: the sensitivity measures of the continuous targets with respect to the
+// covariates (the inputs of the correlated set).
+//
+// Delta measure (tornado bars). For covariate k with delta δ_k = s_k × d (d standard
+// deviations), each accepted case is scored again with x_k + δ_k and with x_k − δ_k; the mean
+// changes of target t are the two ends of k's bar. For a linear model t = Σ a_k x_k they are
+// ±a_k δ_k exactly.
+//
+// Contribution to variance. With a second, independent case x', the record that takes x'_k for
+// input k and the case's own values elsewhere gives Y_k. Cov(Y, Y_k) = Var(E[Y | x_−k]), so
+// (V − (E[Y·Y_k] − μ²)) / V = E[Var(Y | x_−k)] / V, the share of the variance that input k
+// accounts for together with its interactions (Sobol's total-effect index; Homma & Saltelli,
+// 1996). For independent inputs of a linear model it is a_k² Var(x_k) / V.
+#include "simulation_evaluation/secsimulator.h"
+
+#include "mccommon/mcmv.h"
+
+#include <algorithm>
+
+namespace MCMCSP_800 {
+
+using MCCommon_800::MCMV;
+using MCCommon_800::MCStatus;
+using MCMath_800::MCContStats;
+
+void SECSimulator::PrepareSensitivity() {
+    fbDeltaMeasure = fpSettings->UseTornadoStddev();
+    fbVarianceMeasure = fpSettings->TornadoVariance();
+    fvContTargetPos.clear();
+    for (const Target& target : fvTargets) {
+        if (!target.fbCategorical) {
+            fvContTargetPos.push_back(target.fValuePos);
+        }
+    }
+    const std::size_t nCovariates = fvCorrelated.size();
+    const std::size_t cells = fvContTargetPos.size() * nCovariates;
+    fvPosDiff.assign(cells, MCMV::Missing());
+    fvNegDiff.assign(cells, MCMV::Missing());
+    fvProducts.assign(cells, MCMV::Missing());
+    fvSavedInputs.assign(fvSimInputs.size(), MCMV::Missing());
+    fvSavedValues.assign(static_cast<std::size_t>(fNValuesPerCase), MCMV::Missing());
+    fvWorkInputs.assign(fvSimInputs.size(), MCMV::Missing());
+    fvFurther.assign(fvSimInputs.size(), MCMV::Missing());
+    for (SECContinuousTargetInfo& info : fpOutputStats->GetContTargetInfo()) {
+        info.fvPositiveDelta.assign(nCovariates, MCMV::Missing());
+        info.fvNegativeDelta.assign(nCovariates, MCMV::Missing());
+        info.fvVarianceContrib.assign(nCovariates, MCMV::Missing());
+        info.fvPositiveDeltaStats.assign(fbDeltaMeasure ? nCovariates : 0, MCContStats());
+        info.fvNegativeDeltaStats.assign(fbDeltaMeasure ? nCovariates : 0, MCContStats());
+        info.fvVarianceContribStats.assign(fbVarianceMeasure ? nCovariates : 0, MCContStats());
+    }
+}
+
+MCStatus SECSimulator::ComputeCaseSensitivity() {
+    const std::size_t nCovariates = fvCorrelated.size();
+    const std::size_t nTargets = fvContTargetPos.size();
+    fvSavedInputs = fvCaseValues;
+    fvSavedValues = fvScoreValues;
+    const auto restore = [this]() {
+        fvCaseValues = fvSavedInputs;
+        fvScoreValues = fvSavedValues;
+    };
+    // Differences of every continuous target from the case's own score.
+    const auto record = [&](std::vector<double>& table, std::size_t k) {
+        for (std::size_t t = 0; t < nTargets; ++t) {
+            const auto pos = static_cast<std::size_t>(fvContTargetPos[t]);
+            table[t * nCovariates + k] = fvScoreValues[pos] - fvSavedValues[pos];
+        }
+    };
+
+    if (fbDeltaMeasure) {
+        fvWorkInputs = fvSavedInputs;
+        for (std::size_t k = 0; k < nCovariates; ++k) {
+            const double delta = fvCorrelated[k].fTornadoDelta;
+            if (MCMV::IsMissing(delta) || !(delta > 0.0)) {
+                continue;
+            }
+            const auto pos = static_cast<std::size_t>(fvCorrelated[k].fCasePos);
+            const double saved = fvSavedInputs[pos];
+            // The shifted values are not held to the truncation bounds or the natural range.
+            fvWorkInputs[pos] = saved + delta;
+            MCStatus status = ScoreInputs(fvWorkInputs);
+            if (status.IsError()) {
+                restore();
+                return status;
+            }
+            record(fvPosDiff, k);
+            fvWorkInputs[pos] = saved - delta;
+            status = ScoreInputs(fvWorkInputs);
+            if (status.IsError()) {
+                restore();
+                return status;
+            }
+            record(fvNegDiff, k);
+            fvWorkInputs[pos] = saved;
+        }
+    }
+
+    if (fbVarianceMeasure) {
+        // The base case keeps its own rejection count and contingency cell.
+        const int savedCell = fCrosstabCell;
+        const int savedRejections = fLastRejections;
+        const MCStatus drawn = DrawAndScoreCase();
+        fvFurther = fvCaseValues;
+        fCrosstabCell = savedCell;
+        fLastRejections = savedRejections;
+        if (drawn.IsError()) {
+            restore();
+            return drawn;
+        }
+        fvWorkInputs = fvSavedInputs;
+        for (std::size_t k = 0; k < nCovariates; ++k) {
+            if (!fvCorrelated[k].fbVarianceContrib) {
+                continue;
+            }
+            const auto pos = static_cast<std::size_t>(fvCorrelated[k].fCasePos);
+            fvWorkInputs[pos] = fvFurther[pos];
+            const MCStatus status = ScoreInputs(fvWorkInputs);
+            if (status.IsError()) {
+                restore();
+                return status;
+            }
+            for (std::size_t t = 0; t < nTargets; ++t) {
+                const auto tpos = static_cast<std::size_t>(fvContTargetPos[t]);
+                fvProducts[t * nCovariates + k] = fvSavedValues[tpos] * fvScoreValues[tpos];
+            }
+            fvWorkInputs[pos] = fvSavedInputs[pos];
+        }
+    }
+    restore();
+    return MCStatus();
+}
+
+void SECSimulator::AccumulateSensitivity() {
+    const std::size_t nCovariates = fvCorrelated.size();
+    std::vector<SECContinuousTargetInfo>& cont = fpOutputStats->GetContTargetInfo();
+    for (std::size_t t = 0; t < cont.size(); ++t) {
+        SECContinuousTargetInfo& info = cont[t];
+        for (std::size_t k = 0; k < nCovariates; ++k) {
+            const std::size_t cell = t * nCovariates + k;
+            const double delta = fvCorrelated[k].fTornadoDelta;
+            if (fbDeltaMeasure && !MCMV::IsMissing(delta) && delta > 0.0) {
+                info.fvPositiveDeltaStats[k].Update(fvPosDiff[cell]);
+                info.fvNegativeDeltaStats[k].Update(fvNegDiff[cell]);
+            }
+            if (fbVarianceMeasure && fvCorrelated[k].fbVarianceContrib) {
+                info.fvVarianceContribStats[k].Update(fvProducts[cell]);
+            }
+        }
+    }
+}
+
+void SECSimulator::CompleteSensitivity() {
+    const std::size_t nCovariates = fvCorrelated.size();
+    for (SECContinuousTargetInfo& info : fpOutputStats->GetContTargetInfo()) {
+        const double variance = info.fContStats.GetVariance();
+        const double mean = info.fContStats.GetMean();
+        info.fvPositiveDelta.assign(nCovariates, MCMV::Missing());
+        info.fvNegativeDelta.assign(nCovariates, MCMV::Missing());
+        info.fvVarianceContrib.assign(nCovariates, MCMV::Missing());
+        for (std::size_t k = 0; k < nCovariates; ++k) {
+            const double delta = fvCorrelated[k].fTornadoDelta;
+            if (fbDeltaMeasure && !MCMV::IsMissing(delta) && delta > 0.0 &&
+                k < info.fvPositiveDeltaStats.size()) {
+                info.fvPositiveDelta[k] = info.fvPositiveDeltaStats[k].GetMean();
+                info.fvNegativeDelta[k] = info.fvNegativeDeltaStats[k].GetMean();
+            }
+            if (fbVarianceMeasure && fvCorrelated[k].fbVarianceContrib &&
+                k < info.fvVarianceContribStats.size() && !MCMV::IsMissing(variance) &&
+                variance > 0.0) {
+                const double meanProduct = info.fvVarianceContribStats[k].GetMean();
+                if (!MCMV::IsMissing(meanProduct)) {
+                    info.fvVarianceContrib[k] = (variance - (meanProduct - mean * mean)) / variance;
+                }
+            }
+        }
+    }
+}
+
+} // namespace MCMCSP_800
