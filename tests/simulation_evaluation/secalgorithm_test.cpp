@@ -605,3 +605,55 @@ TEST(SimulationFailures, ModelErrorsExceptionsAndExhaustedAttempts) {
         EXPECT_EQ(run.Run().GetErrorCode(), MCSPStatus::kAttemptsExhausted);
     }
 }
+
+// ---- Completion of the inputs' results -----------------------------------------------------------
+
+TEST(Completion, CellSharesAndCorrelationsInThePlansOrder) {
+    simgen::TestPlan tp;
+    MCThread_800::MCStdThreadFactory threads;
+    tp.settings.SetThreadFactory(&threads);
+    tp.settings.SetMaxThreadNum(2);
+    tp.plan.SetMaxCases(60000);
+    for (const char* name : {"a", "b", "c"}) {
+        tp.AddInput(name, simgen::MakeDist(kDistNormal, {{"mean", 0.0}, {"stddev", 1.0}}));
+    }
+    tp.AddInput("f", simgen::MakeCategorical({"f0", "f1"}, {0.5, 0.5}), kLevelCategorical);
+    tp.AddInput("g", simgen::MakeCategorical({"g0", "g1"}, {0.5, 0.5}), kLevelCategorical);
+    tp.plan.SetCrstabsFactors({"f", "g"});
+    tp.plan.SetCrstabsMatrix({{"f0", "g0"}, {"f0", "g1"}, {"f1", "g0"}, {"f1", "g1"}});
+    tp.plan.SetCrstabsProbs({0.1, 0.2, 0.3, 0.4});
+    // The plan lists its correlation variables as c, a, b.
+    tp.plan.SetCorrMatrixCell("c", "c", 1.0);
+    tp.plan.SetCorrMatrixCell("a", "c", 0.0);
+    tp.plan.SetCorrMatrixCell("a", "a", 1.0);
+    tp.plan.SetCorrMatrixCell("b", "c", 0.0);
+    tp.plan.SetCorrMatrixCell("b", "a", 0.8);
+    tp.plan.SetCorrMatrixCell("b", "b", 1.0);
+    ASSERT_EQ(tp.plan.GetCorrVarList(), (std::vector<std::string>{"c", "a", "b"}));
+    auto factory = scorers::MakeFactory([]() -> std::unique_ptr<IMCScoreComputer> {
+        LinearTarget t;
+        t.fName = "t";
+        t.fvCoefs = {{"a", 1.0}, {"c", 1.0}};
+        return std::make_unique<scorers::LinearScorer>(std::vector<LinearTarget>{t},
+                                                       IMCScoreComputer::kTransformsOnly,
+                                                       nullptr);
+    });
+    SECAlgorithm alg(tp.settings, tp.plan, tp.vars);
+    MCCommon_800::MCMemoryRecordIter data({MCXML_800::Record(1)});
+    ASSERT_TRUE(alg.BuildModel(data, nullptr).IsOK());
+    ASSERT_TRUE(alg.SimulateData(&factory, nullptr).IsOK());
+    SECOutputStats* res = nullptr;
+    ASSERT_TRUE(alg.GetOutputStats(res).IsOK());
+    const std::vector<double>& shares = res->GetCrstSimProbs();
+    ASSERT_EQ(shares.size(), 4u);
+    for (std::size_t i = 0; i < 4; ++i) {
+        EXPECT_NEAR(shares[i], 0.1 * static_cast<double>(i + 1), 0.01);
+    }
+    const MCMath_800::MCSymMatrix& corr = res->GetSimulCorr();
+    ASSERT_EQ(corr.GetNRows(), 3);
+    EXPECT_NEAR(corr.GetElem(2, 1), 0.8, 0.01); // b with a
+    EXPECT_NEAR(corr.GetElem(1, 0), 0.0, 0.02); // a with c
+    EXPECT_EQ(corr.GetElem(0, 0), 1.0);
+    EXPECT_EQ(res->GetFactorNames(), (std::vector<std::string>{"f", "g"}));
+    EXPECT_EQ(res->GetCovariateNames(), (std::vector<std::string>{"a", "b", "c"}));
+}
