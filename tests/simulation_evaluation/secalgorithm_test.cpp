@@ -7,6 +7,7 @@
 // 4·4 + 9·16/12 + Var(e) = 16 + 12 + 8.49 = 36.49; a delta of d standard deviations moves t by
 // exactly ±a_k·d·s_k, and input k's share of the variance is a_k²·Var(x_k)/36.49.
 #include "simulation_evaluation/secalgorithm.h"
+#include "simulation_evaluation/secpolycorrtask.h"
 #include "simulation_evaluation/secsimulator.h"
 
 #include "data/simgen_plans.h"
@@ -64,19 +65,28 @@ struct LinearRun {
         return t;
     }
 
-    //! Runs the component-driven simulation with `factory` (default: the linear model as a
-    //! regression "prediction").
-    MCStatus Run(MCXML_800::IMCSPScoreFactory* factory = nullptr,
-                 MCXML_800::SECAppDataProcess* sink = nullptr) {
+    //! Creates the algorithm and builds its model.
+    void Build() {
+        alg = std::make_unique<SECAlgorithm>(tp.settings, tp.plan, tp.vars);
+        MCCommon_800::MCMemoryRecordIter data({MCXML_800::Record(1)});
+        EXPECT_TRUE(alg->BuildModel(data, nullptr).IsOK());
+    }
+
+    //! Runs the component-driven simulation of the built algorithm with `factory` (default:
+    //! the linear model as a regression "prediction").
+    MCStatus Simulate(MCXML_800::IMCSPScoreFactory* factory = nullptr,
+                      MCXML_800::SECAppDataProcess* sink = nullptr) {
         auto linear = scorers::MakeFactory([this]() -> std::unique_ptr<IMCScoreComputer> {
             return std::make_unique<scorers::LinearScorer>(
                 std::vector<LinearTarget>{Model()}, IMCScoreComputer::kRegression, &counter);
         });
-        alg = std::make_unique<SECAlgorithm>(tp.settings, tp.plan, tp.vars);
-        MCCommon_800::MCMemoryRecordIter data({MCXML_800::Record(1)});
-        const MCStatus built = alg->BuildModel(data, nullptr);
-        EXPECT_TRUE(built.IsOK());
         return alg->SimulateData(factory != nullptr ? factory : &linear, sink);
+    }
+
+    MCStatus Run(MCXML_800::IMCSPScoreFactory* factory = nullptr,
+                 MCXML_800::SECAppDataProcess* sink = nullptr) {
+        Build();
+        return Simulate(factory, sink);
     }
 
     const SECOutputStats& Results(std::size_t iteration = 0) const {
@@ -295,14 +305,15 @@ TEST(SimulationThreads, SinkReceivesEveryGoodCaseUnderTheLock) {
 
 TEST(SimulationCancel, FromAnotherThreadEndsWithStatus1AndMergedResults) {
     LinearRun run(2, 8u, 50000000);
-    std::thread canceller([&run]() {
-        while (!run.alg || run.alg->GetSimulatedCaseCount() < 20000) {
+    run.Build();
+    SECAlgorithm* alg = run.alg.get();
+    std::thread canceller([alg]() {
+        while (alg->GetSimulatedCaseCount() < 20000) {
             std::this_thread::sleep_for(std::chrono::milliseconds(1));
         }
-        run.alg->Cancel();
+        alg->Cancel();
     });
-    // The algorithm is created inside Run; the canceller waits for it.
-    const MCStatus status = run.Run();
+    const MCStatus status = run.Simulate();
     canceller.join();
     EXPECT_EQ(status.GetErrorCode(), MCSPStatus::kCancelled);
     const SECOutputStats& res = run.Results();
@@ -656,4 +667,16 @@ TEST(Completion, CellSharesAndCorrelationsInThePlansOrder) {
     EXPECT_EQ(corr.GetElem(0, 0), 1.0);
     EXPECT_EQ(res->GetFactorNames(), (std::vector<std::string>{"f", "g"}));
     EXPECT_EQ(res->GetCovariateNames(), (std::vector<std::string>{"a", "b", "c"}));
+}
+
+TEST(Completion, PolyCorrTaskRunsOnTheThreadServiceAndLeavesTheListsEmpty) {
+    LinearRun run(1, 3u, 2000);
+    ASSERT_TRUE(run.Run().IsOK());
+    SECOutputStats* res = nullptr;
+    ASSERT_TRUE(run.alg->GetOutputStats(res).IsOK());
+    SECPolyCorrTask task(0, 1, res, {{0, 0}}, 0.0, false);
+    MCThread_800::MCStdThreadFactory threads;
+    threads.CreateThreadGroup(1)->Run({&task});
+    EXPECT_TRUE(task.GetStatus().IsOK());
+    EXPECT_TRUE(run.Target().fvPolyserialCorrs.empty());
 }
