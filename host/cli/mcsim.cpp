@@ -1,9 +1,13 @@
 // The mcsim command: the reference host's way into the component.
 //
-//   mcsim fit DATA.csv [options]   fit distributions to the fields of a CSV file
+//   mcsim fit DATA.csv [options]       fit distributions to the fields of a CSV file
+//   mcsim simulate PLAN.xml [options]  simulate a plan with its model
+//   mcsim demo [options]               the bundled example end to end
 //
 // Every subcommand answers --help.
+#include "cli/democommand.h"
 #include "cli/fitcommand.h"
+#include "cli/simulatecommand.h"
 #include "component/mcspcomponent.h"
 
 #include <CLI/CLI.hpp>
@@ -17,6 +21,10 @@ int main(int argc, char** argv) {
 
     MCHost::FitOptions fitOptions;
     CLI::App* fit = MCHost::AddFitCommand(app, fitOptions);
+    MCHost::SimulateOptions simulateOptions;
+    CLI::App* simulate = MCHost::AddSimulateCommand(app, simulateOptions);
+    MCHost::DemoOptions demoOptions;
+    CLI::App* demo = MCHost::AddDemoCommand(app, demoOptions);
 
     try {
         app.parse(argc, argv);
@@ -25,6 +33,12 @@ int main(int argc, char** argv) {
     }
     if (fit->parsed()) {
         return MCHost::RunFit(fitOptions, std::cout, std::cerr);
+    }
+    if (simulate->parsed()) {
+        return MCHost::RunSimulate(simulateOptions, std::cout, std::cerr);
+    }
+    if (demo->parsed()) {
+        return MCHost::RunDemo(demoOptions, std::cout, std::cerr);
     }
     return 1;
 }

@@ -1,0 +1,298 @@
+#include "cli/report.h"
+
+#include "data/plandictionary.h"
+#include "mccommon/mcmv.h"
+#include "mccommon/numtext.h"
+#include "mccommon/variables.h"
+#include "simulation_common/spcsettings.h"
+
+#include <algorithm>
+#include <cmath>
+
+namespace MCHost {
+
+using MCCommon_800::MCMV;
+using MCMCSP_800::MCHistogramData;
+using MCMCSP_800::SECOutputStats;
+using MCMCSP_800::SPCSettings;
+
+namespace {
+
+//! Entry `i` of `values`, missing when the list is shorter.
+double At(const std::vector<double>& values, std::size_t i) {
+    return i < values.size() ? values[i] : MCMV::Missing();
+}
+
+//! The measures of one target against each covariate, in covariate order.
+std::vector<ReportInputMeasures> InputMeasures(const std::vector<std::string>& covariates,
+                                               const std::vector<double>& correlations,
+                                               const std::vector<double>& negative,
+                                               const std::vector<double>& positive,
+                                               const std::vector<double>& variance) {
+    std::vector<ReportInputMeasures> measures;
+    for (std::size_t k = 0; k < covariates.size(); ++k) {
+        measures.push_back(ReportInputMeasures{covariates[k], At(correlations, k), At(negative, k),
+                                               At(positive, k), At(variance, k)});
+    }
+    return measures;
+}
+
+//! The label of a categorical target's category `value`, from the target's variable: a text
+//! category's value is its code, a numeric category's value its number.
+std::string CategoryLabel(const MCXML_800::MCVarList& vars, const std::string& target,
+                          double value) {
+    const MCXML_800::IMCVariable* var = vars.GetVariable(target);
+    const MCXML_800::MCCatNumEncoder* enc = var ? var->GetCategorical() : nullptr;
+    if (enc && !MCMV::IsMissing(value)) {
+        int code = -1;
+        if (enc->IsString()) {
+            if (value == std::floor(value) && value >= 0.0 &&
+                value < static_cast<double>(enc->GetNCategories())) {
+                code = static_cast<int>(value);
+            }
+        } else {
+            code = enc->Encode(value);
+        }
+        if (code >= 0) {
+            return enc->GetCategoryText(code);
+        }
+    }
+    return MCMV::IsMissing(value) ? std::string("missing") : MCCommon_800::FormatDefault(value);
+}
+
+ReportCategoricalTarget BuildCategorical(const MCMCSP_800::SECCategoricalTargetInfo& info,
+                                         const SECOutputStats& stats) {
+    ReportCategoricalTarget target;
+    target.fName = info.fName;
+    double total = 0.0;
+    for (double c : info.fvCatCounts) {
+        total += MCMV::IsMissing(c) ? 0.0 : c;
+    }
+    // Every category of the target's variable is listed, counted or not. Without category
+    // values the counts run by value: entry i counts the cases whose category value is i.
+    const MCXML_800::IMCVariable* var = stats.GetMCVarList()->GetVariable(info.fName);
+    const std::size_t nDeclared =
+        var && var->GetCategorical()
+            ? static_cast<std::size_t>(var->GetCategorical()->GetNCategories())
+            : 0;
+    const std::size_t n =
+        std::max({info.fvCategoryValues.size(), info.fvCatCounts.size(), nDeclared});
+    for (std::size_t i = 0; i < n; ++i) {
+        ReportCategory category;
+        category.fValue =
+            i < info.fvCategoryValues.size() ? info.fvCategoryValues[i] : static_cast<double>(i);
+        category.fLabel = CategoryLabel(*stats.GetMCVarList(), info.fName, category.fValue);
+        category.fCount = i < info.fvCatCounts.size() ? info.fvCatCounts[i] : 0.0;
+        category.fShare = (total > 0.0 && !MCMV::IsMissing(category.fCount))
+                              ? category.fCount / total
+                              : MCMV::Missing();
+        category.fMeanProbability = At(info.fvMeanProbs, i);
+        target.fvCategories.push_back(std::move(category));
+    }
+    target.fvInputs = InputMeasures(stats.GetCovariateNames(), info.fvPearsonCorrs, {}, {}, {});
+    return target;
+}
+
+ReportContinuousTarget BuildContinuous(const MCMCSP_800::SECContinuousTargetInfo& info,
+                                       const SECOutputStats& stats,
+                                       const std::vector<double>& percentiles) {
+    ReportContinuousTarget target;
+    target.fName = info.fName;
+    target.fMean = info.fMean;
+    target.fStdDev = info.fStdDev;
+    target.fCiLower = info.fCiLower;
+    target.fCiUpper = info.fCiUpper;
+    target.fMinimum = info.fMinimum;
+    target.fMaximum = info.fMaximum;
+    for (double p : percentiles) {
+        target.fvPercentiles.push_back(ReportPercentile{
+            p, HistogramPercentile(info.fHistogram, p, info.fMinimum, info.fMaximum)});
+    }
+    target.fBinWidth = info.fHistogram.GetBinWidth();
+    target.fvBins = HistogramBins(info.fHistogram);
+    target.fvInputs =
+        InputMeasures(stats.GetCovariateNames(), info.fvPearsonCorrs, info.fvNegativeDelta,
+                      info.fvPositiveDelta, info.fvVarianceContrib);
+    return target;
+}
+
+//! The pairs of correlated inputs, in the order of the plan's correlation variables (the order
+//! of the simulated matrix), or of the covariates when the plan sets no correlations.
+std::vector<ReportCorrelation> BuildCorrelations(const SECOutputStats& stats) {
+    const SPCSettings& plan = *stats.GetSPCSettings();
+    const std::vector<std::string>& names =
+        plan.GetCorrVarList().empty() ? stats.GetCovariateNames() : plan.GetCorrVarList();
+    std::vector<SPCSettings::CorrMatrixCell> cells;
+    plan.GetCorrMatrixCellCollection(cells);
+    const MCMath_800::MCSymMatrix& simulated = stats.GetSimulCorr();
+    std::vector<ReportCorrelation> pairs;
+    for (std::size_t i = 0; i < names.size(); ++i) {
+        for (std::size_t j = i + 1; j < names.size(); ++j) {
+            ReportCorrelation pair{names[i], names[j], MCMV::Missing(), MCMV::Missing()};
+            for (const SPCSettings::CorrMatrixCell& cell : cells) {
+                if ((cell.fRowVar == names[i] && cell.fColVar == names[j]) ||
+                    (cell.fRowVar == names[j] && cell.fColVar == names[i])) {
+                    pair.fPlan = cell.fValue;
+                }
+            }
+            if (static_cast<int>(j) < simulated.GetNRows()) {
+                pair.fSimulated = simulated.GetElem(static_cast<int>(i), static_cast<int>(j));
+            }
+            pairs.push_back(std::move(pair));
+        }
+    }
+    return pairs;
+}
+
+//! The round width nearest to `raw` on a log scale: 1, 2, 2.5 or 5 times a power of ten. The
+//! steps of that series are at most a factor 2 apart, so the number of rows stays within a
+//! factor sqrt(2) of the number asked for.
+double RoundWidth(double raw) {
+    const double power = std::pow(10.0, std::floor(std::log10(raw)));
+    double best = power;
+    for (double m : {1.0, 2.0, 2.5, 5.0, 10.0}) {
+        if (std::fabs(std::log(m * power / raw)) < std::fabs(std::log(best / raw))) {
+            best = m * power;
+        }
+    }
+    return best;
+}
+
+} // namespace
+
+std::vector<HistogramBin> HistogramBins(const MCHistogramData& histogram) {
+    std::vector<HistogramBin> bins;
+    const double width = histogram.GetBinWidth();
+    const double minimum = histogram.GetMinimum();
+    auto add = [&](int index, double count, double mean) {
+        if (!(count > 0.0)) {
+            return;
+        }
+        const double lower = minimum + static_cast<double>(index) * width;
+        bins.push_back(HistogramBin{lower, lower + width, count, mean});
+    };
+    const MCHistogramData::OutlierBinMap& outliers = histogram.GetOutlierBinMap();
+    auto it = outliers.begin();
+    for (; it != outliers.end() && it->first < 0; ++it) {
+        add(it->first, it->second.fFreqCount, it->second.fMean);
+    }
+    const std::vector<double>& counts = histogram.GetBinFreqCounts();
+    const std::vector<double>& means = histogram.GetBinMeans();
+    for (std::size_t b = 0; b < counts.size(); ++b) {
+        add(static_cast<int>(b), counts[b], At(means, b));
+    }
+    for (; it != outliers.end(); ++it) {
+        add(it->first, it->second.fFreqCount, it->second.fMean);
+    }
+    return bins;
+}
+
+// Percentile of grouped data (the interpolation formula for a grouped frequency distribution,
+// e.g. Hoel, "Introduction to Mathematical Statistics", 1984, section 2.3): with n the total
+// count, F the count below the bin that holds rank r = p/100 * n, f that bin's count and
+// [L, U) its range, the percentile is L + (r - F) / f * (U - L). It assumes the values are
+// spread evenly over each bin, so it is exact to within one bin width.
+double HistogramPercentile(const MCHistogramData& histogram, double percent, double minimum,
+                           double maximum) {
+    const std::vector<HistogramBin> bins = HistogramBins(histogram);
+    double total = 0.0;
+    for (const HistogramBin& b : bins) {
+        total += b.fCount;
+    }
+    if (bins.empty() || !(total > 0.0) || MCMV::IsMissing(percent)) {
+        return MCMV::Missing();
+    }
+    auto clamp = [&](double x) {
+        if (!MCMV::IsMissing(minimum) && x < minimum) {
+            x = minimum;
+        }
+        if (!MCMV::IsMissing(maximum) && x > maximum) {
+            x = maximum;
+        }
+        return x;
+    };
+    // A histogram of one bin has no width to interpolate over: all its values are alike.
+    if (histogram.GetBinWidth() <= 0.0) {
+        return clamp(bins.front().fMean);
+    }
+    const double rank = std::clamp(percent, 0.0, 100.0) / 100.0 * total;
+    double below = 0.0;
+    for (const HistogramBin& b : bins) {
+        if (below + b.fCount >= rank) {
+            // A bin whose mean is the smallest (largest) value seen holds only that value: a
+            // point mass, such as the zeros of a target that is often 0, needs no spreading.
+            if (!MCMV::IsMissing(b.fMean) && ((!MCMV::IsMissing(minimum) && b.fMean <= minimum) ||
+                                              (!MCMV::IsMissing(maximum) && b.fMean >= maximum))) {
+                return clamp(b.fMean);
+            }
+            const double lower = clamp(b.fLower);
+            const double upper = clamp(b.fUpper);
+            return lower + (rank - below) / b.fCount * (upper - lower);
+        }
+        below += b.fCount;
+    }
+    return clamp(bins.back().fUpper);
+}
+
+std::vector<HistogramRow> GroupHistogram(const std::vector<HistogramBin>& bins, double minimum,
+                                         double maximum, int nRows) {
+    std::vector<HistogramRow> rows;
+    if (bins.empty() || MCMV::IsMissing(minimum) || MCMV::IsMissing(maximum) || nRows < 1) {
+        return rows;
+    }
+    double total = 0.0;
+    for (const HistogramBin& b : bins) {
+        total += b.fCount;
+    }
+    const double span = maximum - minimum;
+    if (!(span > 0.0) || !std::isfinite(span)) {
+        rows.push_back(HistogramRow{minimum, maximum, total});
+        return rows;
+    }
+    const double width = RoundWidth(span / nRows);
+    const double start = std::floor(minimum / width) * width;
+    const auto n = static_cast<std::size_t>(std::max(1.0, std::ceil((maximum - start) / width)));
+    for (std::size_t r = 0; r < n; ++r) {
+        const double lower = start + static_cast<double>(r) * width;
+        rows.push_back(HistogramRow{lower, lower + width, 0.0});
+    }
+    for (const HistogramBin& b : bins) {
+        const double x = MCMV::IsMissing(b.fMean) ? b.fLower : b.fMean;
+        const double r = std::floor((x - start) / width);
+        const std::size_t row = r < 0.0 ? 0 : std::min(n - 1, static_cast<std::size_t>(r));
+        rows[row].fCount += b.fCount;
+    }
+    return rows;
+}
+
+ReportIteration BuildReportIteration(const SECOutputStats& stats, int index,
+                                     const std::vector<double>& percentiles) {
+    ReportIteration it;
+    it.fIndex = index;
+    const SPCSettings& plan = *stats.GetSPCSettings();
+    it.fVaryingInput = DescribeSensitivityIteration(plan, index);
+    it.fSimulated = stats.GetSimCaseCount();
+    it.fFiltered = stats.GetFilteredCaseCount();
+    it.fValid = stats.GetValidCaseCount();
+    it.fInvalid = stats.GetInvalidCaseCount();
+    it.fbStopped = stats.GetStopCriteria();
+    for (const auto& info : stats.GetContTargetInfo()) {
+        it.fvContinuous.push_back(BuildContinuous(info, stats, percentiles));
+    }
+    for (const auto& info : stats.GetCateTargetInfo()) {
+        it.fvCategorical.push_back(BuildCategorical(info, stats));
+    }
+    it.fvCorrelations = BuildCorrelations(stats);
+    it.fvFactors = plan.GetCrstabsFactors();
+    const auto& rows = plan.GetCrstabsMatrix();
+    const auto& planProbs = plan.GetCrstabsProbs();
+    const auto& simProbs = stats.GetCrstSimProbs();
+    for (std::size_t r = 0; r < rows.size() && !it.fvFactors.empty(); ++r) {
+        it.fvCells.push_back(
+            ReportCell{rows[r], At(planProbs, r),
+                       simProbs.size() == rows.size() ? simProbs[r] : MCMV::Missing()});
+    }
+    return it;
+}
+
+} // namespace MCHost

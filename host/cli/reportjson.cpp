@@ -1,0 +1,156 @@
+#include "cli/reportjson.h"
+
+#include "mccommon/mcmv.h"
+
+#include <cmath>
+
+namespace MCHost {
+
+using Json = nlohmann::ordered_json;
+using MCCommon_800::MCMV;
+
+namespace {
+
+//! A number, or null for the missing value (and anything not finite, which JSON cannot carry).
+Json Number(double x) {
+    if (MCMV::IsMissing(x) || !std::isfinite(x)) {
+        return Json(nullptr);
+    }
+    return Json(x);
+}
+
+Json InputMeasures(const std::vector<ReportInputMeasures>& inputs, bool continuous) {
+    Json list = Json::array();
+    for (const ReportInputMeasures& m : inputs) {
+        Json entry;
+        entry["input"] = m.fInput;
+        entry["correlation"] = Number(m.fCorrelation);
+        if (continuous) {
+            entry["delta_negative"] = Number(m.fDeltaNegative);
+            entry["delta_positive"] = Number(m.fDeltaPositive);
+            entry["variance_contribution"] = Number(m.fVarianceShare);
+        }
+        list.push_back(std::move(entry));
+    }
+    return list;
+}
+
+Json Continuous(const ReportContinuousTarget& t, double ciLevel) {
+    Json target;
+    target["name"] = t.fName;
+    target["mean"] = Number(t.fMean);
+    target["std_dev"] = Number(t.fStdDev);
+    target["ci"] =
+        Json{{"level", ciLevel}, {"lower", Number(t.fCiLower)}, {"upper", Number(t.fCiUpper)}};
+    target["min"] = Number(t.fMinimum);
+    target["max"] = Number(t.fMaximum);
+    Json percentiles = Json::array();
+    for (const ReportPercentile& p : t.fvPercentiles) {
+        percentiles.push_back(Json{{"percent", p.fPercent}, {"value", Number(p.fValue)}});
+    }
+    target["percentiles"] = std::move(percentiles);
+    Json bins = Json::array();
+    for (const HistogramBin& b : t.fvBins) {
+        bins.push_back(Json{{"lower", Number(b.fLower)},
+                            {"upper", Number(b.fUpper)},
+                            {"count", Number(b.fCount)},
+                            {"mean", Number(b.fMean)}});
+    }
+    target["histogram"] = Json{{"bin_width", Number(t.fBinWidth)}, {"bins", std::move(bins)}};
+    target["sensitivity"] = InputMeasures(t.fvInputs, true);
+    return target;
+}
+
+Json Categorical(const ReportCategoricalTarget& t) {
+    Json target;
+    target["name"] = t.fName;
+    Json categories = Json::array();
+    for (const ReportCategory& c : t.fvCategories) {
+        categories.push_back(Json{{"label", c.fLabel},
+                                  {"value", Number(c.fValue)},
+                                  {"count", Number(c.fCount)},
+                                  {"share", Number(c.fShare)},
+                                  {"mean_probability", Number(c.fMeanProbability)}});
+    }
+    target["categories"] = std::move(categories);
+    target["sensitivity"] = InputMeasures(t.fvInputs, false);
+    return target;
+}
+
+Json Iteration(const ReportIteration& it, const SimulationReport& report) {
+    Json entry;
+    entry["index"] = it.fIndex;
+    entry["varying_input"] = it.fVaryingInput.empty() ? Json(nullptr) : Json(it.fVaryingInput);
+    entry["counts"] = Json{{"simulated", it.fSimulated},
+                           {"valid", it.fValid},
+                           {"invalid", it.fInvalid},
+                           {"filtered", it.fFiltered}};
+    entry["stopped_by_criterion"] =
+        report.fbHasStopCriterion && !report.fbCancelled ? Json(it.fbStopped) : Json(nullptr);
+    Json continuous = Json::array();
+    for (const ReportContinuousTarget& t : it.fvContinuous) {
+        continuous.push_back(Continuous(t, report.fCiLevel));
+    }
+    entry["continuous_targets"] = std::move(continuous);
+    Json categorical = Json::array();
+    for (const ReportCategoricalTarget& t : it.fvCategorical) {
+        categorical.push_back(Categorical(t));
+    }
+    entry["categorical_targets"] = std::move(categorical);
+    Json pairs = Json::array();
+    for (const ReportCorrelation& c : it.fvCorrelations) {
+        pairs.push_back(Json{{"first", c.fFirst},
+                             {"second", c.fSecond},
+                             {"plan", Number(c.fPlan)},
+                             {"simulated", Number(c.fSimulated)}});
+    }
+    entry["input_correlations"] = std::move(pairs);
+    if (it.fvFactors.empty()) {
+        entry["contingency_table"] = nullptr;
+    } else {
+        Json cells = Json::array();
+        for (const ReportCell& c : it.fvCells) {
+            cells.push_back(Json{{"categories", c.fvCategories},
+                                 {"plan", Number(c.fPlan)},
+                                 {"simulated", Number(c.fSimulated)}});
+        }
+        entry["contingency_table"] = Json{{"factors", it.fvFactors}, {"cells", std::move(cells)}};
+    }
+    return entry;
+}
+
+} // namespace
+
+Json ReportToJson(const SimulationReport& report) {
+    Json doc;
+    doc["format"] = "mcsim simulation results";
+    doc["version"] = kResultsFormatVersion;
+    doc["plan"] = report.fPlanPath;
+    doc["model"] = report.fModelPath;
+    doc["settings"] = Json{{"cases", report.fCases},
+                           {"seed", report.fSeed},
+                           {"threads", report.fThreads},
+                           {"confidence_level", report.fCiLevel},
+                           {"tornado_delta_sd", Number(report.fTornadoDelta)},
+                           {"contribution_to_variance", report.fbVariance}};
+    doc["status"] = report.fbCancelled ? "cancelled" : "completed";
+    Json iterations = Json::array();
+    for (const ReportIteration& it : report.fvIterations) {
+        iterations.push_back(Iteration(it, report));
+    }
+    doc["iterations"] = std::move(iterations);
+    Json warnings = Json::array();
+    for (const ReportWarning& w : report.fvWarnings) {
+        warnings.push_back(Json{{"code", w.fCode},
+                                {"kind", w.fbWarning ? "warning" : "error"},
+                                {"text", w.fText},
+                                {"count", w.fCount}});
+    }
+    doc["warnings"] = std::move(warnings);
+    doc["model_errors"] = Json{
+        {"count", report.fModelErrors},
+        {"first", report.fFirstModelError.empty() ? Json(nullptr) : Json(report.fFirstModelError)}};
+    return doc;
+}
+
+} // namespace MCHost

@@ -1,0 +1,479 @@
+// End-to-end runs of `mcsim simulate` and `mcsim demo` through the built command on the
+// bundled examples: results against closed-form values, reproducibility, the case file, the
+// JSON document, and broken inputs (one message, exit status 1, no output file).
+//
+// examples/plans/demand_plan.xml has closed-form answers (derived in its header comment):
+// unit_margin ~ Normal(8, 2); E[revenue] = 20 * 1100 + rho * 2 * 147.196 with rho = -0.4;
+// E[profit] = E[revenue] - 13200; E[bonus] = 45; P(volume_band = large) = 0.257143.
+// Statistical checks allow 5 standard errors (a false failure about once in 1.7 million runs
+// per check, and the seed is fixed). The correlation model estimates each normal correlation
+// from 1000 pairs with a search tolerance of 0.01, so the simulated price-units correlation
+// misses -0.4 by about 0.02 (one standard deviation over seeds); checks that depend on it
+// allow kRhoSlack.
+#include "hosttestfiles.h"
+
+#include "mctolerance.h"
+
+#include <nlohmann/json.hpp>
+
+#include <gtest/gtest.h>
+
+#include <boost/math/distributions/normal.hpp>
+
+#include <algorithm>
+#include <cmath>
+#include <cstdio>
+#include <filesystem>
+#include <functional>
+#include <map>
+#include <sstream>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#ifndef MCSIM_EXE
+#error "MCSIM_EXE (the path of the mcsim command) is set by host/CMakeLists.txt"
+#endif
+
+namespace {
+
+using Json = nlohmann::json;
+
+const std::string kExamples = MCSIM_EXAMPLES_DIR;
+const std::string kModel = kExamples + "/models/demand.model";
+//! How far the simulated correlation of two inputs may miss the plan's: four standard
+//! deviations of the correlation model's estimate.
+constexpr double kRhoSlack = 0.08;
+
+struct CommandRun {
+    int status = -1; //!< exit status
+    std::string out; //!< standard output
+    std::string err; //!< standard error
+};
+
+std::string Quote(const std::string& s) {
+    std::string q = "'";
+    for (char c : s) {
+        q += (c == '\'') ? std::string("'\\''") : std::string(1, c);
+    }
+    return q + "'";
+}
+
+//! Runs mcsim with `args`; standard error goes through a file outside `dir`'s listing checks.
+CommandRun Mcsim(const std::vector<std::string>& args) {
+    std::string command = Quote(MCSIM_EXE);
+    for (const std::string& a : args) {
+        command += " " + Quote(a);
+    }
+    char errPath[] = "/tmp/mcsim_simulate_test_err_XXXXXX";
+    const int fd = ::mkstemp(errPath);
+    if (fd >= 0) {
+        ::close(fd);
+    }
+    command += " 2>" + Quote(errPath) + " </dev/null";
+    CommandRun run;
+    FILE* pipe = ::popen(command.c_str(), "r");
+    if (!pipe) {
+        return run;
+    }
+    char buffer[4096];
+    std::size_t n = 0;
+    while ((n = std::fread(buffer, 1, sizeof buffer, pipe)) > 0) {
+        run.out.append(buffer, n);
+    }
+    const int raw = ::pclose(pipe);
+    run.status = WIFEXITED(raw) ? WEXITSTATUS(raw) : -1;
+    run.err = hosttest::ReadFile(errPath);
+    std::remove(errPath);
+    return run;
+}
+
+//! The example plan with its model named by an absolute path (so the copy may live anywhere)
+//! and each `from` text replaced by its `to`.
+std::string DemandPlan(const std::vector<std::pair<std::string, std::string>>& edits = {}) {
+    std::string plan = hosttest::ReadFile(kExamples + "/plans/demand_plan.xml");
+    std::vector<std::pair<std::string, std::string>> all{
+        {"file=\"../models/demand.model\"", "file=\"" + kModel + "\""}};
+    all.insert(all.end(), edits.begin(), edits.end());
+    for (const auto& [from, to] : all) {
+        const std::size_t at = plan.find(from);
+        EXPECT_NE(at, std::string::npos) << from;
+        if (at != std::string::npos) {
+            plan.replace(at, from.size(), to);
+        }
+    }
+    return plan;
+}
+
+const Json* FindByName(const Json& list, const std::string& name) {
+    for (const Json& entry : list) {
+        if (entry.at("name") == name) {
+            return &entry;
+        }
+    }
+    return nullptr;
+}
+
+std::vector<std::string> Lines(const std::string& text) {
+    std::vector<std::string> lines;
+    std::istringstream in(text);
+    std::string line;
+    while (std::getline(in, line)) {
+        lines.push_back(line);
+    }
+    return lines;
+}
+
+TEST(McsimSimulate, ExamplePlanMatchesClosedForm) {
+    hosttest::TempDir dir;
+    const std::string json = dir.File("results.json");
+    const int cases = 100000;
+    const CommandRun run = Mcsim({"simulate", kExamples + "/plans/demand_plan.xml", "--cases",
+                                  std::to_string(cases), "--threads", "2", "--json", json});
+    ASSERT_EQ(run.status, 0) << run.err;
+    EXPECT_EQ(run.err, "");
+    const Json doc = Json::parse(hosttest::ReadFile(json));
+    EXPECT_EQ(doc.at("status"), "completed");
+    ASSERT_EQ(doc.at("iterations").size(), 1u);
+    const Json& it = doc.at("iterations")[0];
+    const Json& counts = it.at("counts");
+    EXPECT_EQ(counts.at("simulated").get<int>(),
+              counts.at("valid").get<int>() + counts.at("invalid").get<int>());
+    EXPECT_EQ(counts.at("valid").get<int>(), cases);
+    EXPECT_TRUE(it.at("stopped_by_criterion").is_null()); // the plan has no criterion
+
+    const double n = cases;
+    const Json* margin = FindByName(it.at("continuous_targets"), "unit_margin");
+    ASSERT_NE(margin, nullptr);
+    EXPECT_NEAR_TOL(margin->at("mean").get<double>(), 8.0, 0.0, 5.0 * 2.0 / std::sqrt(n));
+    EXPECT_NEAR_TOL(margin->at("std_dev").get<double>(), 2.0, 0.0, 5.0 * 2.0 / std::sqrt(2 * n));
+    // The interval is mean -+ z * sd / sqrt(n) with z the 97.5% normal quantile.
+    const double halfWidth = 1.959964 * margin->at("std_dev").get<double>() / std::sqrt(n);
+    EXPECT_NEAR_TOL(margin->at("ci").at("upper").get<double>() -
+                        margin->at("ci").at("lower").get<double>(),
+                    2.0 * halfWidth, 1e-3, 0.0);
+    // Percentiles against the normal quantiles: sampling error sqrt(p(1-p)/n)/density, plus
+    // one histogram bin.
+    const boost::math::normal_distribution<double> normal(8.0, 2.0);
+    const double binWidth = margin->at("histogram").at("bin_width").get<double>();
+    for (const Json& p : margin->at("percentiles")) {
+        const double q = p.at("percent").get<double>() / 100.0;
+        const double exact = boost::math::quantile(normal, q);
+        const double se = std::sqrt(q * (1 - q) / n) / boost::math::pdf(normal, exact);
+        EXPECT_NEAR_TOL(p.at("value").get<double>(), exact, 0.0, 5.0 * se + binWidth) << q;
+    }
+    double binned = 0.0;
+    for (const Json& b : margin->at("histogram").at("bins")) {
+        binned += b.at("count").get<double>();
+    }
+    EXPECT_NEAR_TOL(binned, n, 0.0, 0.5);
+
+    // E[price * units] = E[price] E[units] + rho sd(price) sd(units).
+    const double sdUnits = std::sqrt(390000.0 / 18.0);
+    const Json* revenue = FindByName(it.at("continuous_targets"), "revenue");
+    const Json* profit = FindByName(it.at("continuous_targets"), "profit");
+    ASSERT_TRUE(revenue && profit);
+    const double seRevenue = revenue->at("std_dev").get<double>() / std::sqrt(n);
+    const double rhoSlack = kRhoSlack * 2.0 * sdUnits;
+    EXPECT_NEAR_TOL(revenue->at("mean").get<double>(), 22000.0 - 0.4 * 2.0 * sdUnits, 0.0,
+                    5.0 * seRevenue + rhoSlack);
+    EXPECT_NEAR_TOL(profit->at("mean").get<double>(), revenue->at("mean").get<double>() - 13200.0,
+                    0.0, 5.0 * 12.0 * sdUnits / std::sqrt(n));
+    const Json* bonus = FindByName(it.at("continuous_targets"), "bonus");
+    ASSERT_NE(bonus, nullptr);
+    EXPECT_NEAR_TOL(bonus->at("mean").get<double>(), 45.0, 0.0,
+                    5.0 * 100.0 * std::sqrt(0.45 * 0.55 / n));
+
+    const Json* band = FindByName(it.at("categorical_targets"), "volume_band");
+    ASSERT_NE(band, nullptr);
+    ASSERT_EQ(band->at("categories").size(), 2u);
+    EXPECT_EQ(band->at("categories")[1].at("label"), "large");
+    double total = 0.0;
+    for (const Json& c : band->at("categories")) {
+        total += c.at("count").get<double>();
+    }
+    EXPECT_NEAR_TOL(total, n, 0.0, 0.5);
+    const double pLarge = 300.0 * 300.0 / (700.0 * 500.0);
+    EXPECT_NEAR_TOL(band->at("categories")[1].at("share").get<double>(), pLarge, 0.0,
+                    5.0 * std::sqrt(pLarge * (1 - pLarge) / n));
+
+    ASSERT_EQ(it.at("input_correlations").size(), 1u);
+    const Json& pair = it.at("input_correlations")[0];
+    EXPECT_EQ(pair.at("plan").get<double>(), -0.4);
+    EXPECT_NEAR_TOL(pair.at("simulated").get<double>(), -0.4, 0.0, kRhoSlack);
+
+    // The text report says the same.
+    EXPECT_NE(run.out.find("volume_band  (categorical)"), std::string::npos);
+    EXPECT_NE(run.out.find("price ~ units  -0.400"), std::string::npos);
+}
+
+// profit = (price - 12) * units: moving price by one standard deviation (2) moves profit by
+// 2 * units, on average 2 * 1100; moving units by one (147.196) moves it by 147.196 * (price -
+// 12), on average 147.196 * 8. The shifted values are scored as they are, so the means are
+// exact up to the sampling error of E[units] and E[price].
+TEST(McsimSimulate, TornadoDeltasMatchTheModel) {
+    hosttest::TempDir dir;
+    const std::string json = dir.File("results.json");
+    const CommandRun run =
+        Mcsim({"simulate", kExamples + "/plans/demand_plan.xml", "--cases", "20000", "--json", json,
+               "--tornado-delta", "1", "--variance", "--percentiles", "10,90"});
+    ASSERT_EQ(run.status, 0) << run.err;
+    const Json doc = Json::parse(hosttest::ReadFile(json));
+    EXPECT_EQ(doc.at("settings").at("tornado_delta_sd"), 1.0);
+    const Json* profit = FindByName(doc.at("iterations")[0].at("continuous_targets"), "profit");
+    ASSERT_NE(profit, nullptr);
+    ASSERT_EQ(profit->at("percentiles").size(), 2u);
+    EXPECT_EQ(profit->at("percentiles")[1].at("percent"), 90.0);
+    std::map<std::string, Json> byInput;
+    for (const Json& m : profit->at("sensitivity")) {
+        byInput[m.at("input").get<std::string>()] = m;
+    }
+    ASSERT_EQ(byInput.size(), 2u);
+    const double sdUnits = std::sqrt(390000.0 / 18.0);
+    EXPECT_NEAR_TOL(byInput["price"].at("delta_positive").get<double>(), 2200.0, 0.0,
+                    5.0 * 2.0 * sdUnits / std::sqrt(20000.0));
+    EXPECT_NEAR_TOL(byInput["price"].at("delta_negative").get<double>(), -2200.0, 0.0,
+                    5.0 * 2.0 * sdUnits / std::sqrt(20000.0));
+    EXPECT_NEAR_TOL(byInput["units"].at("delta_positive").get<double>(), 8.0 * sdUnits, 0.0,
+                    5.0 * sdUnits * 2.0 / std::sqrt(20000.0));
+    EXPECT_FALSE(byInput["units"].at("variance_contribution").is_null());
+    EXPECT_NE(run.out.find("change at +1 sd"), std::string::npos);
+}
+
+TEST(McsimSimulate, SameSeedGivesIdenticalFilesAndThreadCountsAllRun) {
+    hosttest::TempDir dir;
+    const std::string plan = kExamples + "/plans/demand_plan.xml";
+    std::vector<std::string> outputs;
+    for (const char* name : {"a", "b"}) {
+        const std::string json = dir.File(std::string(name) + ".json");
+        const std::string cases = dir.File(std::string(name) + ".csv");
+        const CommandRun run = Mcsim({"simulate", plan, "--cases", "3000", "--seed", "12345",
+                                      "--threads", "3", "--json", json, "--cases-out", cases});
+        ASSERT_EQ(run.status, 0) << run.err;
+        outputs.push_back(hosttest::ReadFile(json) + hosttest::ReadFile(cases));
+    }
+    EXPECT_EQ(outputs[0], outputs[1]);
+
+    const CommandRun other = Mcsim({"simulate", plan, "--cases", "3000", "--seed", "54321",
+                                    "--threads", "3", "--json", dir.File("c.json")});
+    ASSERT_EQ(other.status, 0) << other.err;
+    EXPECT_NE(hosttest::ReadFile(dir.File("c.json")), hosttest::ReadFile(dir.File("a.json")));
+
+    for (const char* threads : {"1", "4"}) {
+        const CommandRun run = Mcsim({"simulate", plan, "--cases", "3001", "--threads", threads,
+                                      "--json", dir.File("t.json")});
+        ASSERT_EQ(run.status, 0) << run.err;
+        const Json doc = Json::parse(hosttest::ReadFile(dir.File("t.json")));
+        EXPECT_EQ(doc.at("settings").at("threads").get<int>(), std::stoi(threads));
+        EXPECT_EQ(doc.at("iterations")[0].at("counts").at("valid").get<int>(), 3001);
+    }
+}
+
+TEST(McsimSimulate, CasesFileHoldsEveryCaseWithLabels) {
+    hosttest::TempDir dir;
+    const std::string cases = dir.File("cases.csv");
+    const CommandRun run = Mcsim({"simulate", kExamples + "/plans/demand_plan.xml", "--cases",
+                                  "4000", "--threads", "2", "--cases-out", cases});
+    ASSERT_EQ(run.status, 0) << run.err;
+    const std::vector<std::string> lines = Lines(hosttest::ReadFile(cases));
+    ASSERT_EQ(lines.size(), 4001u);
+    EXPECT_EQ(lines[0], "price,units,region,unit_margin,revenue,profit,bonus,volume_band");
+    int north = 0;
+    for (std::size_t i = 1; i < lines.size(); ++i) {
+        std::vector<std::string> cells;
+        std::istringstream row(lines[i]);
+        std::string cell;
+        while (std::getline(row, cell, ',')) {
+            cells.push_back(cell);
+        }
+        ASSERT_EQ(cells.size(), 8u) << lines[i];
+        EXPECT_TRUE(cells[2] == "north" || cells[2] == "south" || cells[2] == "west");
+        EXPECT_TRUE(cells[7] == "regular" || cells[7] == "large");
+        north += cells[2] == "north" ? 1 : 0;
+    }
+    EXPECT_NEAR_TOL(north / 4000.0, 0.45, 0.0, 5.0 * std::sqrt(0.45 * 0.55 / 4000.0));
+    EXPECT_NE(run.out.find("4000 cases written to"), std::string::npos);
+}
+
+// A fixed input with three values makes three sensitivity iterations: profit drops by
+// 1100 for each unit of cost.
+TEST(McsimSimulate, SensitivityIterationsGetOneBlockEach) {
+    hosttest::TempDir dir;
+    const std::string plan = dir.Write(
+        "sens.xml",
+        DemandPlan({{"<Value value=\"12\"/>",
+                     "<Value value=\"10\"/><Value value=\"12\"/><Value value=\"14\"/>"}}));
+    const CommandRun run = Mcsim({"simulate", plan, "--cases", "5000", "--json", dir.File("r.json"),
+                                  "--cases-out", dir.File("c.csv")});
+    ASSERT_EQ(run.status, 0) << run.err;
+    const Json doc = Json::parse(hosttest::ReadFile(dir.File("r.json")));
+    ASSERT_EQ(doc.at("iterations").size(), 3u);
+    std::vector<double> margins;
+    for (const Json& it : doc.at("iterations")) {
+        EXPECT_EQ(it.at("counts").at("valid").get<int>(), 5000);
+        margins.push_back(
+            FindByName(it.at("continuous_targets"), "unit_margin")->at("mean").get<double>());
+    }
+    EXPECT_EQ(doc.at("iterations")[2].at("varying_input"), "unit_cost = 14");
+    EXPECT_NEAR_TOL(margins[0], 10.0, 0.0, 5.0 * 2.0 / std::sqrt(5000.0));
+    EXPECT_NEAR_TOL(margins[2], 6.0, 0.0, 5.0 * 2.0 / std::sqrt(5000.0));
+    EXPECT_NE(run.out.find("=== iteration 3 of 3: unit_cost = 14 ==="), std::string::npos);
+    const std::vector<std::string> lines = Lines(hosttest::ReadFile(dir.File("c.csv")));
+    ASSERT_EQ(lines.size(), 15001u);
+    EXPECT_EQ(lines[0].substr(lines[0].rfind(',') + 1), "iteration");
+}
+
+// A 1% precision of the mean profit (sd about 2000, mean about 8700) at 95% needs about
+// (1.96 * 2000 / 87)^2, some 2000 cases; the criterion is checked from 1000 cases on.
+TEST(McsimSimulate, StopCriterionEndsTheRun) {
+    hosttest::TempDir dir;
+    const std::string plan = dir.Write(
+        "stop.xml",
+        DemandPlan(
+            {{"<Settings numberOfCriteria=\"0\" simulatedCases=\"100000\"/>",
+              "<Settings numberOfCriteria=\"1\" simulatedCases=\"100000\"><Criteria "
+              "target=\"profit\" type=\"point_value\"><PointValue confidenceLevel=\"95\" "
+              "parameter=\"mean\" threshold=\"1\" unit=\"percent\"/></Criteria></Settings>"}}));
+    const CommandRun run = Mcsim({"simulate", plan, "--json", dir.File("r.json")});
+    ASSERT_EQ(run.status, 0) << run.err;
+    const Json it = Json::parse(hosttest::ReadFile(dir.File("r.json"))).at("iterations")[0];
+    EXPECT_EQ(it.at("stopped_by_criterion"), true);
+    const int valid = it.at("counts").at("valid").get<int>();
+    EXPECT_GE(valid, 1000);
+    EXPECT_LT(valid, 5000);
+    const Json* profit = FindByName(it.at("continuous_targets"), "profit");
+    const double width =
+        profit->at("ci").at("upper").get<double>() - profit->at("mean").get<double>();
+    EXPECT_LE(width, 0.01 * profit->at("mean").get<double>() * 1.001);
+    EXPECT_NE(run.out.find("stop criterion: met"), std::string::npos);
+}
+
+TEST(McsimDemo, RunsTheBundledExampleAndKeepsItsFiles) {
+    hosttest::TempDir dir;
+    const std::string folder = dir.File("demo");
+    const CommandRun run =
+        Mcsim({"demo", "--dir", folder, "--cases", "3000", "--examples", kExamples});
+    ASSERT_EQ(run.status, 0) << run.err;
+    EXPECT_NE(run.out.find("== step 2 of 2"), std::string::npos);
+    EXPECT_NE(run.out.find("margin_band  (categorical)"), std::string::npos);
+    const Json doc = Json::parse(hosttest::ReadFile(folder + "/results.json"));
+    EXPECT_EQ(doc.at("iterations")[0].at("counts").at("valid").get<int>(), 3000);
+    EXPECT_EQ(Lines(hosttest::ReadFile(folder + "/cases.csv")).size(), 3001u);
+    EXPECT_TRUE(std::filesystem::exists(folder + "/sales_plan.xml"));
+}
+
+//! One broken input: the files to write, the extra arguments, and the start of the message.
+struct BadInput {
+    std::string fName;                                                        //!< test name
+    std::function<std::vector<std::string>(const hosttest::TempDir&)> fSetup; //!< args
+    std::string fMessage; //!< expected in the message
+};
+
+std::ostream& operator<<(std::ostream& os, const BadInput& b) {
+    return os << b.fName;
+}
+
+class McsimSimulateBadInput : public ::testing::TestWithParam<BadInput> {};
+
+TEST_P(McsimSimulateBadInput, OneMessageNoOutput) {
+    hosttest::TempDir dir;
+    std::vector<std::string> args{"simulate"};
+    for (const std::string& a : GetParam().fSetup(dir)) {
+        args.push_back(a);
+    }
+    const std::size_t before = dir.Count();
+    for (const char* option : {"--json", "--cases-out"}) {
+        if (std::find(args.begin(), args.end(), option) == args.end()) {
+            args.insert(args.end(), {option, dir.File(std::string("out") + option)});
+        }
+    }
+    const CommandRun run = Mcsim(args);
+    EXPECT_EQ(run.status, 1);
+    EXPECT_EQ(run.out, "");
+    EXPECT_EQ(run.err.find("mcsim: "), 0u) << run.err;
+    EXPECT_NE(run.err.find(GetParam().fMessage), std::string::npos) << run.err;
+    EXPECT_EQ(std::count(run.err.begin(), run.err.end(), '\n'), 1) << run.err;
+    EXPECT_EQ(dir.Count(), before) << "an output file or a temporary file was left behind";
+}
+
+std::vector<std::string> PlanWith(const hosttest::TempDir& dir,
+                                  const std::vector<std::pair<std::string, std::string>>& edits) {
+    return {dir.Write("plan.xml", DemandPlan(edits))};
+}
+
+std::vector<std::string> PlanAndModel(const hosttest::TempDir& dir, const std::string& model) {
+    return {dir.Write("plan.xml", DemandPlan()), "--model", dir.Write("bad.model", model)};
+}
+
+INSTANTIATE_TEST_SUITE_P(
+    Table, McsimSimulateBadInput,
+    ::testing::Values(
+        BadInput{
+            "MissingPlan",
+            [](const hosttest::TempDir& d) { return std::vector<std::string>{d.File("none.xml")}; },
+            "none.xml: cannot open the plan file"},
+        BadInput{"MalformedXml",
+                 [](const hosttest::TempDir& d) {
+                     return std::vector<std::string>{
+                         d.Write("plan.xml", "<SimulationPlan>\n<ModelFiles>\n</SimulationPlan>")};
+                 },
+                 "plan.xml:3:"},
+        BadInput{"NotAPlan",
+                 [](const hosttest::TempDir& d) {
+                     return std::vector<std::string>{d.Write("plan.xml", "<FitStats/>")};
+                 },
+                 "not a simulation plan"},
+        BadInput{"ReaderRefuses",
+                 [](const hosttest::TempDir& d) {
+                     return PlanWith(d, {{"simulatedCases=\"100000\"", "simulatedCases=\"many\""}});
+                 },
+                 "plan.xml: the plan reader refused the file"},
+        BadInput{"CorrelationOfUnknownField",
+                 [](const hosttest::TempDir& d) {
+                     return PlanWith(d, {{"colVar=\"price\" rowVar=\"units\"",
+                                          "colVar=\"price\" rowVar=\"cost\""}});
+                 },
+                 "the correlation matrix names 'cost'"},
+        BadInput{"StopCriterionOnCategoricalTarget",
+                 [](const hosttest::TempDir& d) {
+                     return PlanWith(
+                         d, {{"<Settings numberOfCriteria=\"0\" simulatedCases=\"100000\"/>",
+                              "<Settings numberOfCriteria=\"1\" simulatedCases=\"100000\">"
+                              "<Criteria target=\"volume_band\" type=\"tail\"><Tail "
+                              "threshold=\"1\" frequency=\"10\"/></Criteria></Settings>"}});
+                 },
+                 "a stop criterion names 'volume_band', which is not a continuous target"},
+        BadInput{"MissingModel",
+                 [](const hosttest::TempDir& d) {
+                     return std::vector<std::string>{d.Write("plan.xml", DemandPlan()), "--model",
+                                                     d.File("none.model")};
+                 },
+                 "none.model: cannot open the model file"},
+        BadInput{"ModelSyntaxError",
+                 [](const hosttest::TempDir& d) {
+                     return PlanAndModel(d, "unit_margin = price * (units\n");
+                 },
+                 "bad.model:1: syntax error"},
+        BadInput{"ModelUnknownField",
+                 [](const hosttest::TempDir& d) {
+                     return PlanAndModel(d, "unit_margin = price\nrevenue = price * volume\n");
+                 },
+                 "bad.model:2: unknown name 'volume'"},
+        BadInput{"TextInputWithoutLevels",
+                 [](const hosttest::TempDir& d) {
+                     return PlanAndModel(d, "unit_margin = price\nnorth = region == 0\n");
+                 },
+                 "bad.model:2: the model uses 'region', which holds text"},
+        BadInput{"PlanTargetNotInModel",
+                 [](const hosttest::TempDir& d) {
+                     return PlanAndModel(d, "unit_margin = price - unit_cost\n");
+                 },
+                 "the plan names the target 'revenue'"},
+        BadInput{"UnwritableOutput",
+                 [](const hosttest::TempDir& d) {
+                     return std::vector<std::string>{d.Write("plan.xml", DemandPlan()), "--json",
+                                                     d.File("no/such/folder/r.json")};
+                 },
+                 "--json: "}),
+    [](const ::testing::TestParamInfo<BadInput>& p) { return p.param.fName; });
+
+} // namespace
