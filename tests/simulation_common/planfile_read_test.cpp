@@ -277,7 +277,7 @@ TEST(PlanFileRead, ShippedExamplePlanReads) {
     MCPlanXMLHandler handler;
     SPCSettings* target = &plan;
     ASSERT_TRUE(handler.ParsePlanFile(file, target));
-    EXPECT_EQ(plan.GetModelFile(), "profit_model.xml");
+    EXPECT_EQ(plan.GetModelFile(), "../models/order_profit.model");
     const SPCSettings example = ExamplePlan();
     ASSERT_EQ(plan.GetSimulationInput().size(), example.GetSimulationInput().size());
     for (std::size_t i = 0; i < plan.GetSimulationInput().size(); ++i) {

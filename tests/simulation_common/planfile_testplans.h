@@ -185,7 +185,7 @@ inline SPCSettings RichPlan() {
 // and a stop criterion on the mean.
 inline SPCSettings ExamplePlan() {
     SPCSettings plan;
-    plan.SetModel("profit_model.xml", false);
+    plan.SetModel("../models/order_profit.model", false);
     SPCSettings::ModelFileTarget profit = Target("profit", kLevelContinuous);
     profit.fOutputFormat = "F10.2";
     profit.fComment = "Profit per order";
