@@ -51,7 +51,7 @@ public:
         for (std::size_t k = 0; k < coefs.size(); ++k) {
             y += coefs[k] * input[fvPos[k]].GetReal();
         }
-        const std::string& region = input[fRegion].GetString();
+        const std::string& region = input[fRegion].GetText();
         y += region == "south" ? 5.0 : region == "west" ? -3.0 : 0.0;
         output[0].SetReal(y);
         return MCStatus();

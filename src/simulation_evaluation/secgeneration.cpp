@@ -128,6 +128,178 @@ double PositionInCell(const std::vector<double>& table, int i, double u) {
     return width > 0.0 ? (u - table[static_cast<std::size_t>(i)]) / width : 0.0;
 }
 
+//! ln φ(z) = −z²/2 − ln √(2π), the standard normal log density.
+double LogNormalDensity(double z) {
+    constexpr double kLnSqrtTwoPi = 0.91893853320467274178;
+    return -0.5 * z * z - kLnSqrtTwoPi;
+}
+
+//! E(z) = −ln(1 − Φ(z)) = −ln Φ(−z), a unit exponential value of the normal score: through
+//! log1p(−Φ(z)) in the lower half, where Φ(−z) is near 1 and its logarithm would cancel, and
+//! through ln Φ(−z) in the upper half, where Φ(−z) keeps its relative accuracy.
+double UnitExponential(double z) {
+    return z < 0.0 ? -std::log1p(-MCDistFun::CdfStdNorm(z)) : -std::log(MCDistFun::CdfStdNorm(-z));
+}
+
+//! A quantile at u = Φ(z), from the upper-tail probability Φ(−z) when z > 0 so that the upper
+//! tail keeps its relative accuracy (see MCGammaQuantile::Complement).
+template <class Quantile> double QuantileOfScore(const Quantile& quantile, double z) {
+    return z <= 0.0 ? quantile(MCDistFun::CdfStdNorm(z))
+                    : quantile.Complement(MCDistFun::CdfStdNorm(-z));
+}
+
+// ---- The table in z ---------------------------------------------------------------------------
+//
+// The points of MCNormalScoreTable for each tabulated type: x = g(z) by the exact transform, a
+// coordinate y of it, and dy/dz, d²y/dz² from g' = φ(z)/f(x) and g'' = g'·(−z − ℓ(x)·g'),
+// ℓ = f'/f the log-density slope (derivation in mcquantile.h). In the coordinates used:
+//   linear y = x:            y' = φ/f,  y'' = y'·(−z − ℓ·y')
+//   log y = ln(x − o):       y' = φ/((x − o)·f),  y'' = y'·(−z − (L + 1)·y'),  L = ℓ·(x − o)
+//   logistic y = ln(x/(1 − x)): y' = φ/(x(1 − x)f),  y'' = y'·(−z − y'·(α(1 − x) − βx)) (Beta)
+// With E = −ln Φ(−z): Uniform on [a, b]: y' = (b − a)φ. Triangular below the mode c,
+// x − a = √((c − a)(b − a)u): y' = (c − a)(b − a)φ/(2(x − a)), ℓ = 1/(x − a); above it,
+// b − x = √((b − a)(b − c)(1 − u)): y' = (b − a)(b − c)φ/(2(b − x)), ℓ = −1/(b − x). Weibull
+// (scale a, shape b, location c; the Exponential of rate θ is a = 1/θ, b = 1, c = 0), w = x − c
+// = a·E^(1/b): y = ln w, y' = φ/(b·Φ(−z)·E), L + 1 = b(1 − E). Gamma (shape k, rate β):
+// ln(x·f(x)) = k·ln(βx) − βx − ln Γ(k), L + 1 = k − βx. Beta (α, β):
+// ln(x(1 − x)f(x)) = α·ln x + β·ln(1 − x) − ln B(α, β).
+
+//! Values of x − o below this are treated as underflowed: the point is left out.
+constexpr double kTinyValue = 1e-300;
+
+using ScorePoint = MCMath_800::MCNormalScoreTable::Point;
+
+//! The log-scale point of a value w = x − o > 0 with y' = exp(lnPhi − ln(w·f(x))) and
+//! L + 1 = lPlusOne. False when w underflows or a derivative is not finite.
+bool LogScalePoint(double w, double lnPhi, double lnWf, double lPlusOne, double z, ScorePoint& pt) {
+    if (!(w >= kTinyValue) || !IsFinite(w)) {
+        return false;
+    }
+    pt.fY = std::log(w);
+    pt.fDy = std::exp(lnPhi - lnWf);
+    pt.fD2y = pt.fDy * (-z - lPlusOne * pt.fDy);
+    return IsFinite(pt.fDy) && IsFinite(pt.fD2y);
+}
+
+//! The Weibull point (location c, scale a, shape b), which also serves the Exponential.
+bool WeibullPoint(double a, double b, double z, double lnPhi, ScorePoint& pt) {
+    const double e = UnitExponential(z);
+    const double q = MCDistFun::CdfStdNorm(-z);
+    if (!(e > 0.0) || !(q > 0.0)) {
+        return false;
+    }
+    // y' = φ/(b·q·E), so ln(w·f) = ln b + ln q + ln E.
+    return LogScalePoint(a * std::pow(e, 1.0 / b), lnPhi, std::log(b) + std::log(q) + std::log(e),
+                         b * (1.0 - e), z, pt);
+}
+
+//! The point of `gen` at z (`side` −1 or +1 at the Triangular's mode: which branch gives the
+//! derivatives). False where the exact transform gives no usable value.
+bool ScorePointOf(const SECInputGenerator& gen, double z, int side, ScorePoint& pt) {
+    pt.fX = SECTransformExact(gen, z);
+    if (!IsFinite(pt.fX)) {
+        return false;
+    }
+    const double* p = gen.fvParams.data();
+    const double x = pt.fX;
+    const double lnPhi = LogNormalDensity(z);
+    switch (gen.fDistType) {
+    case MCSPConst::kDistUniform:
+        pt.fY = x;
+        pt.fDy = (p[1] - p[0]) * std::exp(lnPhi);
+        pt.fD2y = -z * pt.fDy;
+        return true;
+    case MCSPConst::kDistTriangular: {
+        const double a = p[0];
+        const double b = p[1];
+        const double c = p[2];
+        const bool lower = side != 0 ? side < 0 : x < c;
+        const double distance = lower ? x - a : b - x; // to the end the branch's root is taken at
+        if (!(distance > 0.0)) {
+            return false;
+        }
+        const double width = lower ? (c - a) * (b - a) : (b - a) * (b - c);
+        pt.fY = x;
+        pt.fDy = width * std::exp(lnPhi) / (2.0 * distance);
+        // ℓ·y' = ±y'/distance: + below the mode, − above it.
+        pt.fD2y = pt.fDy * (-z - (lower ? 1.0 : -1.0) * pt.fDy / distance);
+        return IsFinite(pt.fDy) && IsFinite(pt.fD2y);
+    }
+    case MCSPConst::kDistExponential:
+        return WeibullPoint(1.0 / p[0], 1.0, z, lnPhi, pt);
+    case MCSPConst::kDistWeibull:
+        return WeibullPoint(p[0], p[1], z, lnPhi, pt);
+    case MCSPConst::kDistGamma: {
+        const double k = p[0];
+        const double bx = p[1] * x;
+        const double lnXf = k * std::log(bx) - bx - MCDistFun::norvanednlgam(k);
+        return LogScalePoint(x, lnPhi, lnXf, k - bx, z, pt);
+    }
+    case MCSPConst::kDistBeta: {
+        const double alpha = p[0];
+        const double beta = p[1];
+        const double xc = 1.0 - x;
+        if (!(x >= kTinyValue) || !(xc > 0.0)) {
+            return false;
+        }
+        const double lnX = std::log(x);
+        const double lnXc = std::log1p(-x);
+        const double lnBeta = MCDistFun::norvanednlgam(alpha) + MCDistFun::norvanednlgam(beta) -
+                              MCDistFun::norvanednlgam(alpha + beta);
+        pt.fY = lnX - lnXc;
+        pt.fDy = std::exp(lnPhi - (alpha * lnX + beta * lnXc - lnBeta));
+        pt.fD2y = pt.fDy * (-z - pt.fDy * (alpha * xc - beta * x));
+        return IsFinite(pt.fY) && IsFinite(pt.fDy) && IsFinite(pt.fD2y);
+    }
+    default:
+        return false;
+    }
+}
+
+//! Builds gen.fScoreTable for the tabulated types (see the header); leaves it empty for the
+//! others. A table that could not be built leaves every draw to the exact transform.
+void BuildScoreTable(SECInputGenerator& gen) {
+    using MCMath_800::MCNormalScoreTable;
+    MCNormalScoreTable::Setup setup;
+    const double* p = gen.fvParams.data();
+    // The natural range bounds the pieces that interpolate the value itself.
+    if (!MCMV::IsMissing(gen.fLower)) {
+        setup.fLower = gen.fLower;
+    }
+    if (!MCMV::IsMissing(gen.fUpper)) {
+        setup.fUpper = gen.fUpper;
+    }
+    switch (gen.fDistType) {
+    case MCSPConst::kDistUniform:
+    case MCSPConst::kDistTriangular:
+        setup.fScale = MCNormalScoreTable::Scale::kLinear;
+        setup.fAbsScale = gen.fStdDev;
+        if (gen.fDistType == MCSPConst::kDistTriangular && p[2] > p[0] && p[2] < p[1]) {
+            // The mode: u = (c − a)/(b − a), where the density has its corner.
+            setup.fKink = MCDistFun::IdfNorm((p[2] - p[0]) / (p[1] - p[0]), 0.0, 1.0);
+        }
+        break;
+    case MCSPConst::kDistExponential:
+    case MCSPConst::kDistGamma:
+        setup.fScale = MCNormalScoreTable::Scale::kLog;
+        break;
+    case MCSPConst::kDistWeibull:
+        setup.fScale = MCNormalScoreTable::Scale::kLog;
+        setup.fOrigin = p[2];
+        setup.fAbsScale = std::fabs(p[2]);
+        break;
+    case MCSPConst::kDistBeta:
+        setup.fScale = MCNormalScoreTable::Scale::kLogistic;
+        break;
+    default:
+        return;
+    }
+    const SECInputGenerator& exact = gen;
+    (void)gen.fScoreTable.Build(setup, [&exact](double z, int side, ScorePoint& pt) {
+        return ScorePointOf(exact, z, side, pt);
+    });
+}
+
 //! m, s, the range, the tables and the validity of each type. `p` is the stored vector, whose
 //! length SECBuildStoredParams has checked (it is checked again here for callers that build
 //! vectors by hand).
@@ -457,7 +629,11 @@ bool SECPrepareGenerator(DistType type, const std::vector<double>& params, SECIn
     gen.fbExactDiscrete = false;
     gen.fbHasSensitivity = false;
     gen.fQuantile = std::monostate();
+    gen.fScoreTable.Clear();
     gen.fbValid = !params.empty() && PrepareByType(type, params, gen);
+    if (gen.fbValid) {
+        BuildScoreTable(gen);
+    }
     return gen.fbValid;
 }
 
@@ -507,10 +683,14 @@ double SECNegBinInverse(double r, double p, double u) {
     return IntegerInverse([r, p](double x) { return NegBinCdf(r, p, x); }, -1.0, u);
 }
 
+namespace {
+
 // The transforms of the distribution table. u = Φ(z); where a formula needs 1 − u it is taken
 // as Φ(−z), which keeps its relative accuracy in the upper tail (1 − Φ(z) would round to 0
-// beyond z ≈ 8.3 and turn an Exponential or Weibull value infinite).
-double SECTransform(const SECInputGenerator& gen, double z) {
+// beyond z ≈ 8.3 and turn an Exponential or Weibull value infinite), and −ln(1 − u) is taken
+// as log1p(−u) in the lower half, where 1 − u is near 1. The Gamma and Beta quantiles take the
+// upper-tail probability Φ(−z) for z > 0 for the same reason.
+double ExactTransform(const SECInputGenerator& gen, double z) {
     if (MCMV::IsMissing(z) || !gen.fbValid) {
         return MCMV::Missing();
     }
@@ -569,14 +749,14 @@ double SECTransform(const SECInputGenerator& gen, double z) {
         return p[0] + MCDistFun::CdfStdNorm(z) * (p[1] - p[0]);
     case MCSPConst::kDistWeibull:
         // c + a·(−ln(1 − u))^(1/b).
-        return p[2] + p[0] * std::pow(-std::log(MCDistFun::CdfStdNorm(-z)), 1.0 / p[1]);
+        return p[2] + p[0] * std::pow(UnitExponential(z), 1.0 / p[1]);
     case MCSPConst::kDistGamma:
-        return std::get<MCMath_800::MCGammaQuantile>(gen.fQuantile)(MCDistFun::CdfStdNorm(z));
+        return QuantileOfScore(std::get<MCMath_800::MCGammaQuantile>(gen.fQuantile), z);
     case MCSPConst::kDistBeta:
-        return std::get<MCMath_800::MCBetaQuantile>(gen.fQuantile)(MCDistFun::CdfStdNorm(z));
+        return QuantileOfScore(std::get<MCMath_800::MCBetaQuantile>(gen.fQuantile), z);
     case MCSPConst::kDistExponential:
         // −ln(1 − u)/θ: the parameter acts as a rate.
-        return -std::log(MCDistFun::CdfStdNorm(-z)) / p[0];
+        return UnitExponential(z) / p[0];
     case MCSPConst::kDistBernoulli:
         return MCDistFun::CdfStdNorm(z) >= 1.0 - p[0] ? 1.0 : 0.0;
     case MCSPConst::kDistEmpirical: {
@@ -602,6 +782,25 @@ double SECTransform(const SECInputGenerator& gen, double z) {
     default:
         return MCMV::Missing();
     }
+}
+
+} // namespace
+
+// The table first, where it has a value; the exact transform is a direct call within this
+// file (no call through the library's symbol table), which the types without a table (Normal,
+// LogNormal, the discrete ones) take every time.
+double SECTransform(const SECInputGenerator& gen, double z) {
+    if (gen.fScoreTable.IsReady()) {
+        const double x = gen.fScoreTable(z);
+        if (!std::isnan(x)) {
+            return x;
+        }
+    }
+    return ExactTransform(gen, z);
+}
+
+double SECTransformExact(const SECInputGenerator& gen, double z) {
+    return ExactTransform(gen, z);
 }
 
 } // namespace MCMCSP_800

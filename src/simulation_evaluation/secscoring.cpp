@@ -140,6 +140,7 @@ MCStatus SECSimulator::StartScoring() {
     MCSP_ASSERT(static_cast<std::size_t>(fInputRecord.Size()) ==
                     fvSimInputs.size() + fvFixedInputs.size(),
                 "SECSimulator::StartScoring: input names are unique");
+    fvLastCode.assign(fvSimInputs.size(), -1);
 
     fOutputRecord.Clear();
     fPredictedIndex = -1;
@@ -333,6 +334,11 @@ MCStatus SECSimulator::FinishTargetSetup() {
         }
     }
     results.GetCovarStats().assign(nCorrelated, MCContStats());
+    fpCovarStats = &results.GetCovarStats();
+    fvCovarMin.assign(nCorrelated, std::numeric_limits<double>::infinity());
+    fvCovarMax.assign(nCorrelated, -std::numeric_limits<double>::infinity());
+    fpContInfo = &cont;
+    fpCatInfo = &cat;
     fProvMeans = MCMath_800::MCProvMeans(static_cast<int>(nCorrelated + fvTargets.size()), true);
     fvCombined.assign(nCorrelated + fvTargets.size(), MCMV::Missing());
     fvScoreValues.assign(static_cast<std::size_t>(fNValuesPerCase), MCMV::Missing());
@@ -437,11 +443,17 @@ MCStatus SECSimulator::ScoreInputs(const std::vector<double>& inputs) {
             fvCategorical[static_cast<std::size_t>(input.fGroupIndex)].fSampler;
         const bool known = !MCMV::IsMissing(x) && x >= 0.0 &&
                            x < static_cast<double>(sampler.fvCategoryText.size());
-        const auto code = known ? static_cast<std::size_t>(x) : 0;
+        const int code = known ? static_cast<int>(x) : -1;
+        // A category already in the record is not written again (a text would be copied).
+        if (code >= 0 && code == fvLastCode[i]) {
+            continue;
+        }
+        fvLastCode[i] = code;
+        const auto c = static_cast<std::size_t>(std::max(code, 0));
         if (sampler.fbString) {
-            value.SetString(known ? sampler.fvCategoryText[code] : std::string());
+            value.SetString(known ? sampler.fvCategoryText[c] : std::string());
         } else {
-            value.SetReal(known ? sampler.fvCategoryValues[code] : MCMV::Missing());
+            value.SetReal(known ? sampler.fvCategoryValues[c] : MCMV::Missing());
         }
     }
     ++fScoreCount;
@@ -489,7 +501,8 @@ void SECSimulator::ReadScore() {
 bool SECSimulator::AreTargetsAccepted(const std::vector<double>& values) const {
     for (const Target& target : fvTargets) {
         const double v = values[static_cast<std::size_t>(target.fValuePos)];
-        if (MCMV::IsMissing(v)) {
+        // An infinite score (an overflow in the model) is as unusable as a missing one.
+        if (!std::isfinite(v)) {
             return false;
         }
         if (!target.fbHasFilter) {
@@ -677,11 +690,13 @@ void SECSimulator::AccumulateValues(const std::vector<double>& inputs,
     fFilteredCaseCount += rejections;
     ++fValidCaseCount;
 
-    std::vector<MCContStats>& covarStats = fpOutputStats->GetCovarStats();
+    // The covariates' moments come from the cross products at completion; only their extremes
+    // are kept here.
     const std::size_t nCorrelated = fvCorrelated.size();
     for (std::size_t k = 0; k < nCorrelated; ++k) {
         const double x = inputs[static_cast<std::size_t>(fvCorrelated[k].fCasePos)];
-        covarStats[k].Update(x);
+        fvCovarMin[k] = x < fvCovarMin[k] ? x : fvCovarMin[k];
+        fvCovarMax[k] = x > fvCovarMax[k] ? x : fvCovarMax[k];
         fvCombined[k] = x;
     }
     if (cell >= 0 && static_cast<std::size_t>(cell) < fvCellCounts.size()) {
@@ -692,8 +707,8 @@ void SECSimulator::AccumulateValues(const std::vector<double>& inputs,
     }
     fProvMeans.Update(fvCombined, 1.0);
 
-    std::vector<SECContinuousTargetInfo>& cont = fpOutputStats->GetContTargetInfo();
-    std::vector<SECCategoricalTargetInfo>& cat = fpOutputStats->GetCateTargetInfo();
+    std::vector<SECContinuousTargetInfo>& cont = *fpContInfo;
+    std::vector<SECCategoricalTargetInfo>& cat = *fpCatInfo;
     for (const Target& target : fvTargets) {
         const auto pos = static_cast<std::size_t>(target.fValuePos);
         const double v = values[pos];
@@ -760,9 +775,9 @@ bool SECSimulator::ShouldStop() {
     if (fSimCaseCount >= fCaseQuota) {
         return true;
     }
-    const std::vector<SECContinuousTargetInfo>& cont = fpOutputStats->GetContTargetInfo();
     if (fStopPoint.fKind == StopKind::kPointValue) {
-        const MCContStats& stats = cont[static_cast<std::size_t>(fStopPoint.fTarget)].fContStats;
+        const MCContStats& stats =
+            (*fpContInfo)[static_cast<std::size_t>(fStopPoint.fTarget)].fContStats;
         if (stats.GetSumFreqWeights() >= kStopMinWeight) {
             const double h = fStopPoint.fZ * StandardError(stats);
             // A percentage threshold is a share of the mean's size, whatever its sign.
@@ -936,8 +951,9 @@ SECSimulator::MergeStatsFromThreads(const std::vector<std::unique_ptr<SECSimulat
             status = MCStatus(MCSPStatus::kMergeFailed, false);
             continue;
         }
-        for (std::size_t k = 0; k < covarStats.size(); ++k) {
-            covarStats[k].Pool(wCovar[k]);
+        for (std::size_t k = 0; k < fvCovarMin.size() && k < worker->fvCovarMin.size(); ++k) {
+            fvCovarMin[k] = std::min(fvCovarMin[k], worker->fvCovarMin[k]);
+            fvCovarMax[k] = std::max(fvCovarMax[k], worker->fvCovarMax[k]);
         }
         for (std::size_t t = 0; t < cont.size(); ++t) {
             SECContinuousTargetInfo& to = cont[t];
@@ -1026,6 +1042,14 @@ MCStatus SECSimulator::CompleteStats() {
 
     const MCMath_800::MCSymMatrix& xprods = fProvMeans.GetXProds();
     const auto nCorrelated = static_cast<int>(fvCorrelated.size());
+    std::vector<MCContStats>& covarStats = results.GetCovarStats();
+    covarStats.assign(static_cast<std::size_t>(nCorrelated), MCContStats());
+    for (int k = 0; k < nCorrelated && k < fProvMeans.GetNVars(); ++k) {
+        const auto ku = static_cast<std::size_t>(k);
+        covarStats[ku] = MCContStats::FromSummary(
+            fProvMeans.GetSumWeights(), fProvMeans.GetCount(), fProvMeans.GetMeans()[ku],
+            xprods.GetElem(k, k), fvCovarMin[ku], fvCovarMax[ku]);
+    }
     std::vector<SECContinuousTargetInfo>& cont = results.GetContTargetInfo();
     std::vector<SECCategoricalTargetInfo>& cat = results.GetCateTargetInfo();
     for (std::size_t t = 0; t < fvTargets.size(); ++t) {

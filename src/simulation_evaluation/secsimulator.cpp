@@ -8,6 +8,7 @@
 
 #include <algorithm>
 #include <cmath>
+#include <limits>
 
 namespace MCMCSP_800 {
 
@@ -141,6 +142,10 @@ void SECSimulator::AddSimulatedInput(const SimInputSpecs& specs, int pos) {
     info.fVarIndex = fpVarList->FindVariable(info.fName);
     info.fTruncMin = MissingUnless(specs.HasMinimum(), specs.GetMinimum());
     info.fTruncMax = MissingUnless(specs.HasMaximum(), specs.GetMaximum());
+    info.fAcceptLow = MCMV::IsMissing(info.fTruncMin) ? -std::numeric_limits<double>::infinity()
+                                                      : info.fTruncMin;
+    info.fAcceptHigh = MCMV::IsMissing(info.fTruncMax) ? std::numeric_limits<double>::infinity()
+                                                       : info.fTruncMax;
     info.fbOutput = specs.GetOutput();
     const DistInfoElem* dist = ChooseDistribution(specs);
     MCSP_ASSERT(dist != nullptr, "SECSimulator: a simulated input has a distribution");
@@ -593,9 +598,9 @@ bool SECSimulator::AreInputsWithinBounds() const {
     for (std::size_t i = 0; i < fvSimInputs.size(); ++i) {
         const double value = fvCaseValues[i];
         const SimInput& input = fvSimInputs[i];
-        if (MCMV::IsMissing(value) ||
-            (!MCMV::IsMissing(input.fTruncMin) && value < input.fTruncMin) ||
-            (!MCMV::IsMissing(input.fTruncMax) && value > input.fTruncMax)) {
+        // A value that overflowed to infinity is as unusable as a missing one; an absent bound
+        // is an infinite one.
+        if (!std::isfinite(value) || value < input.fAcceptLow || value > input.fAcceptHigh) {
             return false;
         }
     }

@@ -75,6 +75,8 @@ public:
         double fUpper = 0.0;    //!< natural upper bound narrowed by the maximum; missing if none
         double fTruncMin = 0.0; //!< truncation minimum; missing when not set
         double fTruncMax = 0.0; //!< truncation maximum; missing when not set
+        double fAcceptLow = 0.0;  //!< fTruncMin, or −∞ without one (the acceptance test)
+        double fAcceptHigh = 0.0; //!< fTruncMax, or +∞ without one
         bool fbOutput = true;   //!< SimInputSpecs::GetOutput
     };
 
@@ -503,6 +505,14 @@ private:
     bool fbHostDriven = false;            //!< targets from the plan (PrepareTargetInfo)
     std::vector<Target> fvTargets;        //!< target order
     std::vector<double> fvScoreValues;    //!< values of the last score
+    std::vector<int> fvLastCode;          //!< category last written to the input record
+    //! Extremes of each covariate; their moments are in the cross products (fProvMeans).
+    std::vector<double> fvCovarMin;
+    std::vector<double> fvCovarMax;
+    // The results' vectors the case loop writes to (they keep their size once set up).
+    std::vector<MCMath_800::MCContStats>* fpCovarStats = nullptr;
+    std::vector<SECContinuousTargetInfo>* fpContInfo = nullptr;
+    std::vector<SECCategoricalTargetInfo>* fpCatInfo = nullptr;
     std::vector<double> fvCombined;       //!< correlated inputs, then targets
     std::vector<double> fvInputChartMin;  //!< chart range per simulated input
     std::vector<double> fvInputChartMax;

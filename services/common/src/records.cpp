@@ -21,7 +21,7 @@ Value::Value(std::string text) : fType(kString), fReal(MCMV::Missing()), fText(s
 Value::Value(std::vector<ListEntry> list)
     : fType(kList), fReal(MCMV::Missing()), fList(std::move(list)) {}
 
-double Value::GetReal() const {
+double Value::ConvertToReal() const {
     switch (fType) {
     case kReal:
         return fReal;
@@ -59,9 +59,7 @@ double Value::GetListValue(const std::string& name) const {
     return MCMV::Missing();
 }
 
-void Value::SetReal(double real) {
-    fType = kReal;
-    fReal = real;
+void Value::ClearPayloads() {
     fText.clear();
     fList.clear();
 }

@@ -17,15 +17,13 @@ bool IsUsableWeight(double w) {
     return std::isfinite(w) && w > 0.0;
 }
 
-// West's weighted update of a running mean and sum of squared deviations (West 1979, CACM 22(9),
-// eq. for weighted data): W' = W + w, d = x - mean, mean' = mean + d·(w/W'),
-// M2' = M2 + w·d·(x - mean'). The ratio w/W' is formed first so that the first value sets the
-// mean exactly (w/W' = 1).
-void WestUpdate(double x, double w, double& sumW, double& mean, double& m2) {
-    sumW += w;
-    const double d = x - mean;
-    mean += d * (w / sumW);
-    m2 += w * d * (x - mean);
+//! The mean moved a share `r` (0 < r ≤ 1) of the way towards `x`, given d = x - mean. Normally
+//! mean + d·r; when d overflows (x and the mean near opposite ends of the double range) the
+//! convex combination mean·(1 - r) + x·r, which lies between the two and cannot overflow. The
+//! sum of squared deviations of such data does overflow: it becomes infinite, and the
+//! variance read from it is missing.
+double MoveMean(double mean, double x, double d, double r) {
+    return std::isfinite(d) ? mean + d * r : mean * (1.0 - r) + x * r;
 }
 
 // Chan, Golub and LeVeque's pairwise combination of two chunks A (the running state) and B:
@@ -36,8 +34,13 @@ void ChanPool(double wB, double meanB, double m2B, double& wA, double& meanA, do
     const double d = meanB - meanA;
     const double r = wB / w;
     m2A += m2B + d * d * wA * r;
-    meanA += d * r;
+    meanA = MoveMean(meanA, meanB, d, r);
     wA = w;
+}
+
+//! A variance from a sum of squared deviations: missing when that sum overflowed.
+double FiniteOrMissing(double x) {
+    return std::isfinite(x) ? x : MCMV::Missing();
 }
 
 //! Equality that also holds between two missing values.
@@ -49,22 +52,6 @@ bool SameValue(double a, double b) {
 
 // ------------------------------------------------------------------------------------------
 // MCContStats
-
-bool MCContStats::Update(double x, double weight) {
-    if (!std::isfinite(x) || !IsUsableWeight(weight)) {
-        return false;
-    }
-    if (fCount == 0) {
-        fMin = x;
-        fMax = x;
-    } else {
-        fMin = std::min(fMin, x);
-        fMax = std::max(fMax, x);
-    }
-    WestUpdate(x, weight, fSumWeights, fMean, fSumSqDev);
-    ++fCount;
-    return true;
-}
 
 void MCContStats::Pool(const MCContStats& other) {
     if (other.fCount == 0) {
@@ -86,7 +73,7 @@ double MCContStats::GetMean() const {
 }
 
 double MCContStats::GetVariance() const {
-    return fSumWeights > 1.0 ? fSumSqDev / (fSumWeights - 1.0) : MCMV::Missing();
+    return fSumWeights > 1.0 ? FiniteOrMissing(fSumSqDev / (fSumWeights - 1.0)) : MCMV::Missing();
 }
 
 bool MCContStats::GetExtrema(double& minimum, double& maximum) const {
@@ -189,7 +176,22 @@ void MCMeansXProdData::Reset() {
     fCount = 0;
     fvMeans.assign(n, 0.0);
     fvDelta.assign(n, 0.0);
+    fvXProdSums.assign(fbKeepXProds ? n * (n + 1) / 2 : 0, 0.0);
     fXProds.SetNRows(fbKeepXProds ? fNVars : 0);
+    fbXProdsStale = false;
+}
+
+const MCSymMatrix& MCMeansXProdData::GetXProds() const {
+    if (fbXProdsStale) {
+        std::size_t k = 0;
+        for (int i = 0; i < fNVars; ++i) {
+            for (int j = 0; j <= i; ++j) {
+                fXProds.SetElem(i, j, fvXProdSums[k++]);
+            }
+        }
+        fbXProdsStale = false;
+    }
+    return fXProds;
 }
 
 bool MCMeansXProdData::Merge(const MCMeansXProdData& other) {
@@ -207,7 +209,8 @@ bool MCMeansXProdData::Merge(const MCMeansXProdData& other) {
         fSumWeights = other.fSumWeights;
         fCount = other.fCount;
         fvMeans = other.fvMeans;
-        fXProds = other.fXProds;
+        fvXProdSums = other.fvXProdSums;
+        fbXProdsStale = true;
         return true;
     }
     // Chan's pairwise formula, per element: C = Ca + Cb + (Wa·Wb/W)·d·dᵀ, d = meanB - meanA.
@@ -219,16 +222,17 @@ bool MCMeansXProdData::Merge(const MCMeansXProdData& other) {
         fvDelta[ui] = other.fvMeans[ui] - fvMeans[ui];
     }
     if (fbKeepXProds) {
+        std::size_t k = 0;
         for (int i = 0; i < fNVars; ++i) {
             const double di = s * fvDelta[static_cast<std::size_t>(i)];
-            for (int j = 0; j <= i; ++j) {
-                fXProds.AddToElem(
-                    i, j, other.fXProds.GetElem(i, j) + di * fvDelta[static_cast<std::size_t>(j)]);
+            for (int j = 0; j <= i; ++j, ++k) {
+                fvXProdSums[k] += other.fvXProdSums[k] + di * fvDelta[static_cast<std::size_t>(j)];
             }
         }
+        fbXProdsStale = true;
     }
     for (std::size_t i = 0; i < fvMeans.size(); ++i) {
-        fvMeans[i] += fvDelta[i] * r;
+        fvMeans[i] = MoveMean(fvMeans[i], other.fvMeans[i], fvDelta[i], r);
     }
     fSumWeights = w;
     fCount += other.fCount;
@@ -243,8 +247,9 @@ void MCMeansXProdData::Display() const {
     DisplayD("Sum of weights", fSumWeights);
     DisplayDV("Means", fvMeans);
     std::vector<double> row;
-    for (int i = 0; i < fXProds.GetNRows(); ++i) {
-        fXProds.GetRow(i, row);
+    const MCSymMatrix& xprods = GetXProds();
+    for (int i = 0; i < xprods.GetNRows(); ++i) {
+        xprods.GetRow(i, row);
         DisplayDV("Cross products row", row);
     }
 }
@@ -257,30 +262,36 @@ bool MCProvMeans::Update(const double* values, int n, double weight) {
     if (n != fNVars || !IsUsableWeight(weight)) {
         return false;
     }
+    bool finite = true; // one test after the loop: no branch per value
     for (int i = 0; i < n; ++i) {
-        if (!std::isfinite(values[i])) {
-            return false;
-        }
+        finite &= std::isfinite(values[i]);
     }
-    // Multivariate West update: with d = x - mean (before) and W' = W + w,
-    // mean' = mean + d·(w/W') and C' = C + w·d·(x - mean')ᵀ = C + (w·W/W')·d·dᵀ.
+    if (!finite) {
+        return false;
+    }
+    // Multivariate West update: with d = x - mean (before) and W' = W + w, r = w/W',
+    // mean' = mean + r·d and C' = C + w·d·(x - mean')ᵀ = C + (r·W)·d·dᵀ.
     const double wOld = fSumWeights;
     fSumWeights += weight;
     const double r = weight / fSumWeights;
-    const double rc = weight * (wOld / fSumWeights);
+    const double rc = r * wOld;
+    double* means = fvMeans.data();
+    double* delta = fvDelta.data();
     for (int i = 0; i < n; ++i) {
-        const auto ui = static_cast<std::size_t>(i);
-        const double d = values[i] - fvMeans[ui];
-        fvDelta[ui] = d;
-        fvMeans[ui] += d * r;
+        const double d = values[i] - means[i];
+        delta[i] = d;
+        means[i] = MoveMean(means[i], values[i], d, r);
     }
     if (fbKeepXProds && wOld > 0.0) {
+        double* row = fvXProdSums.data(); // row i of the packed triangle: i + 1 entries
         for (int i = 0; i < n; ++i) {
-            const double di = rc * fvDelta[static_cast<std::size_t>(i)];
+            const double di = rc * delta[i];
             for (int j = 0; j <= i; ++j) {
-                fXProds.AddToElem(i, j, di * fvDelta[static_cast<std::size_t>(j)]);
+                row[j] += di * delta[j];
             }
+            row += i + 1;
         }
+        fbXProdsStale = true;
     }
     ++fCount;
     return true;

@@ -164,7 +164,13 @@ double MCDistFun::IdfBeta(double p, double a, double b) {
     if (p == 1.0) {
         return 1.0;
     }
-    return Finite(boost::math::ibeta_inv(a, b, p, MCMathPolicy()));
+    // Boost 1.74's ibeta_inv throws for extreme p (ibeta_inv(5, 2, 1e-300)) whatever the
+    // policy says; such a quantile is as unavailable as any other the library cannot give.
+    try {
+        return Finite(boost::math::ibeta_inv(a, b, p, MCMathPolicy()));
+    } catch (...) {
+        return MCMV::Missing();
+    }
 }
 
 // ln|Γ(x)| by Boost's Lanczos approximation (reflection for x < 0), kept only where Γ(x) > 0.

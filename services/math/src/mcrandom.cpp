@@ -1,15 +1,12 @@
 #include "mcmath/mcrandom.h"
 
-#include "mcmath/mcdistfun.h"
-
 #include "mcsymmatrixdense.h"
 
 #include "mccommon/mcmv.h"
 
 #include <Eigen/Cholesky>
 #include <Eigen/Core>
-#include <boost/math/constants/constants.hpp>
-#include <boost/math/special_functions/erf.hpp>
+#include <boost/random/normal_distribution.hpp>
 
 #include <algorithm>
 #include <cmath>
@@ -24,8 +21,6 @@ namespace {
 //! 2^-53 and 2^-52: the spacing of the half-open and the open uniform grids.
 constexpr double kTwoPowMinus53 = 1.0 / 9007199254740992.0;
 constexpr double kTwoPowMinus52 = 1.0 / 4503599627370496.0;
-//! The 52 bits of a word that make the magnitude of a normal draw.
-constexpr std::uint64_t kLow52 = (std::uint64_t{1} << 52) - 1;
 //! A pivot of the semi-definite factorisation may fall this far below 0 (relative to the
 //! largest diagonal entry) and still count as a rounding error of a zero pivot.
 constexpr double kPivotTol = 1e-12;
@@ -58,6 +53,32 @@ bool CovarianceFactor(const DenseMatrix& c, DenseMatrix& f) {
     f = ldlt.transpositionsP().transpose() * (lower * d.asDiagonal());
     return f.allFinite() && (f * f.transpose() - c).cwiseAbs().maxCoeff() <= kReproduceTol * scale;
 }
+
+//! True when every entry of `f` above the diagonal is exactly 0.
+bool IsLowerTriangular(const DenseMatrix& f) {
+    for (Eigen::Index i = 0; i < f.rows(); ++i) {
+        for (Eigen::Index j = i + 1; j < f.cols(); ++j) {
+            if (f(i, j) != 0.0) {
+                return false;
+            }
+        }
+    }
+    return true;
+}
+
+//! The words of a stream as a Boost.Random engine over the full 64-bit range, so that Boost's
+//! distributions draw from the stream (the engine's own words or the host's source alike).
+class WordEngine {
+public:
+    using result_type = std::uint64_t;
+    explicit WordEngine(MCURandom& stream) : fStream(stream) {}
+    static constexpr result_type min() { return 0; }
+    static constexpr result_type max() { return ~result_type{0}; }
+    result_type operator()() { return fStream.GetWord(); }
+
+private:
+    MCURandom& fStream; //!< the stream, borrowed for one draw
+};
 
 } // namespace
 
@@ -97,6 +118,7 @@ bool MCRandomValues::SetParamNormal(int n) {
     fScale = 1.0;
     fMeans.assign(static_cast<std::size_t>(n), 0.0);
     fFactor.clear();
+    fbLowerFactor = false;
     fZ.assign(static_cast<std::size_t>(n), 0.0);
     return true;
 }
@@ -116,6 +138,7 @@ bool MCRandomValues::SetParamNormal(const std::vector<double>& means, double sca
         return false;
     }
     fFactor.assign(f.data(), f.data() + f.size());
+    fbLowerFactor = IsLowerTriangular(f);
     fMeans = means;
     fScale = scale;
     fbIndependent = false;
@@ -124,15 +147,11 @@ bool MCRandomValues::SetParamNormal(const std::vector<double>& means, double sca
     return true;
 }
 
-// Inversion of the normal distribution function on a symmetric grid (layout in the header):
-// the magnitude comes from 52 bits through Φ⁻¹(u) = −√2·erfc⁻¹(2u) on (0, 1/2), where erfc⁻¹
-// is accurate to a few ulp, and the sign from the top bit.
+// Boost's ziggurat (see the header): stateless, so one distribution object per draw costs
+// nothing and a copy of the generator never carries a half-used pair.
 double MCRandomValues::NextStdNormal() {
-    const std::uint64_t w = fpURNG->GetWord();
-    const double u = (static_cast<double>((w >> 11) & kLow52) + 0.5) * kTwoPowMinus53;
-    const double t =
-        boost::math::constants::root_two<double>() * boost::math::erfc_inv(2.0 * u, MCMathPolicy());
-    return (w >> 63) != 0 ? t : -t;
+    WordEngine engine(*fpURNG);
+    return boost::random::normal_distribution<double>()(engine);
 }
 
 double MCRandomValues::GetRandom() {
@@ -156,10 +175,12 @@ bool MCRandomValues::GetRandom(std::vector<double>& values) {
         std::copy(fZ.begin(), fZ.end(), values.begin());
         return true;
     }
+    // x_i = m_i + scale·Σ_j F_ij·z_j over j ≤ i for a lower-triangular F, every j otherwise.
     for (std::size_t i = 0; i < n; ++i) {
         const double* row = fFactor.data() + i * n;
+        const std::size_t end = fbLowerFactor ? i + 1 : n;
         double s = 0.0;
-        for (std::size_t j = 0; j < n; ++j) {
+        for (std::size_t j = 0; j < end; ++j) {
             s += row[j] * fZ[j];
         }
         values[i] = fMeans[i] + fScale * s;

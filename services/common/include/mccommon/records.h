@@ -43,18 +43,32 @@ public:
     ValueType GetType() const { return fType; }
     //! The real number; a text that reads wholly as a number gives that number; otherwise
     //! (and for a list) the missing value.
-    double GetReal() const;
+    double GetReal() const { return fType == kReal ? fReal : ConvertToReal(); }
     //! The text; a real is written with the default stream formatting; a list gives "".
     std::string GetString() const;
+    //! The stored text without a copy: "" unless the value is a text.
+    const std::string& GetText() const { return fText; }
     const std::vector<ListEntry>& GetList() const { return fList; }
     //! The value of the list entry named `name`, missing when absent or not a list.
     double GetListValue(const std::string& name) const;
 
-    void SetReal(double real);
+    //! Once a value is a real, setting it again is a store (scoring sets every input per case).
+    void SetReal(double real) {
+        if (fType != kReal) {
+            ClearPayloads();
+            fType = kReal;
+        }
+        fReal = real;
+    }
     void SetString(std::string text);
     void SetList(std::vector<ListEntry> list);
 
 private:
+    //! GetReal of a text or a list.
+    double ConvertToReal() const;
+    //! Empties the text and the list.
+    void ClearPayloads();
+
     ValueType fType;              //!< which payload is in use
     double fReal;                 //!< payload of a real
     std::string fText;            //!< payload of a text

@@ -24,7 +24,10 @@
 
 #include "mcmath/mcsymmatrix.h"
 
+#include <algorithm>
+#include <cmath>
 #include <cstdint>
+#include <limits>
 #include <vector>
 
 namespace MCMath_800 {
@@ -39,8 +42,26 @@ public:
     //! Adds x with weight 1.0; false (nothing changed) when x is missing or not finite.
     bool Update(double x) { return Update(x, 1.0); }
     //! Adds x with frequency weight `weight` (West's update); false when x is missing or not
-    //! finite, or the weight is not a finite positive number.
-    bool Update(double x, double weight);
+    //! finite, or the weight is not a finite positive number. Inline: the simulation calls it
+    //! a dozen times per case from another library.
+    bool Update(double x, double weight) {
+        if (!std::isfinite(x) || !std::isfinite(weight) || !(weight > 0.0)) {
+            return false;
+        }
+        fMin = std::min(fMin, x);
+        fMax = std::max(fMax, x);
+        // West's update (header note); w/W' first, so that the first value sets the mean
+        // exactly. d overflows only for x and the mean near opposite ends of the double range:
+        // the convex combination then keeps the mean between them, and M2 overflows (the
+        // variance is missing).
+        fSumWeights += weight;
+        const double d = x - fMean;
+        const double r = weight / fSumWeights;
+        fMean = std::isfinite(d) ? fMean + d * r : fMean * (1.0 - r) + x * r;
+        fSumSqDev += weight * d * (x - fMean);
+        ++fCount;
+        return true;
+    }
     //! Adds every value of `other` (Chan's pairwise formula); `other` may be this object.
     void Pool(const MCContStats& other);
     //! Forgets every value.
@@ -54,12 +75,30 @@ public:
     double GetMean() const;
     //! Weighted sample variance M2/(W - 1), the unbiased estimate for frequency weights:
     //! √(variance) is the sample standard deviation and √(variance/W) the standard error of the
-    //! mean. Missing when W ≤ 1.
+    //! mean. Missing when W ≤ 1, and when M2 overflowed (values near both ends of the double
+    //! range).
     double GetVariance() const;
     //! M2, the weighted sum of squared deviations from the mean (0 before the first value).
     double GetSumSqDev() const { return fSumSqDev; }
     //! The smallest and largest accepted values; both missing (and false) before the first.
     bool GetExtrema(double& minimum, double& maximum) const;
+
+    //! Statistics of values summarised elsewhere: W, the number of values, the weighted mean,
+    //! M2 and the extremes (the simulation keeps the inputs' moments in its cross products and
+    //! only their extremes per case). No value when W is not positive.
+    static MCContStats FromSummary(double sumWeights, std::int64_t count, double mean,
+                                   double sumSqDev, double minimum, double maximum) {
+        MCContStats stats;
+        if (sumWeights > 0.0 && count > 0) {
+            stats.fSumWeights = sumWeights;
+            stats.fCount = count;
+            stats.fMean = mean;
+            stats.fSumSqDev = sumSqDev;
+            stats.fMin = minimum;
+            stats.fMax = maximum;
+        }
+        return stats;
+    }
 
     //! Diagnostic listing through the display stream.
     void Display() const;
@@ -68,9 +107,12 @@ private:
     double fSumWeights = 0.0; //!< W
     double fMean = 0.0;       //!< running weighted mean (0 while W = 0)
     double fSumSqDev = 0.0;   //!< M2 = Σ w·(x - mean)²
-    double fMin = 0.0;        //!< smallest value (meaningful when fCount > 0)
-    double fMax = 0.0;        //!< largest value (meaningful when fCount > 0)
-    std::int64_t fCount = 0;  //!< accepted updates
+    //! Smallest value; +∞ before the first, so that an update needs no test for the first
+    //! value (GetExtrema reports missing then).
+    double fMin = std::numeric_limits<double>::infinity();
+    //! Largest value; −∞ before the first.
+    double fMax = -std::numeric_limits<double>::infinity();
+    std::int64_t fCount = 0; //!< accepted updates
 };
 
 // ------------------------------------------------------------------------------------------
@@ -157,8 +199,11 @@ public:
     //! Weighted means, one per variable; all 0 before the first row (check GetSumWeights).
     const std::vector<double>& GetMeans() const { return fvMeans; }
     //! The n x n matrix C of weighted sums of cross products of deviations; 0 before the
-    //! first row, 0 x 0 when the cross products are not kept.
-    const MCSymMatrix& GetXProds() const { return fXProds; }
+    //! first row, 0 x 0 when the cross products are not kept. The matrix holds the rows added
+    //! up to this call: the sums are kept packed (see fvXProdSums) and copied into it when it
+    //! is asked for after an update, so call again after adding rows (not safe from two
+    //! threads at once on one object, like every update).
+    const MCSymMatrix& GetXProds() const;
 
     //! Diagnostic listing through the display stream.
     void Display() const;
@@ -169,8 +214,12 @@ protected:
     double fSumWeights = 0.0;    //!< W
     std::int64_t fCount = 0;     //!< accepted rows
     std::vector<double> fvMeans; //!< running weighted means
-    MCSymMatrix fXProds;         //!< C, n x n when kept
-    std::vector<double> fvDelta; //!< scratch: deviations of the row being added
+    //! C as it accumulates: the lower triangle packed row by row, C(i, j) for j ≤ i at
+    //! i(i + 1)/2 + j, so that a row update runs through it in order; empty when not kept.
+    std::vector<double> fvXProdSums;
+    mutable MCSymMatrix fXProds;        //!< C for GetXProds, n x n when kept
+    mutable bool fbXProdsStale = false; //!< fvXProdSums changed since fXProds was filled
+    std::vector<double> fvDelta;        //!< scratch: deviations of the row being added
 };
 
 //! Accumulates rows of n values into an MCMeansXProdData: the fitting's means and
@@ -183,9 +232,10 @@ public:
     MCProvMeans(int nVars, bool keepXProds) : MCMeansXProdData(nVars, keepXProds) {}
 
     //! Adds one row with frequency weight `weight` (the multivariate form of West's update:
-    //! with d = x - mean before the update and r = w·W/W', C += r·d·dᵀ). False, with nothing
-    //! changed, when the row does not hold exactly GetNVars() values, a value is missing or not
-    //! finite, or the weight is not a finite positive number.
+    //! with d = x - mean before the update and r = w·W/W', C += r·d·dᵀ, n(n + 1)/2 products
+    //! into the packed sums, no allocation). False, with nothing changed, when the row does
+    //! not hold exactly GetNVars() values, a value is missing or not finite, or the weight is
+    //! not a finite positive number.
     bool Update(const std::vector<double>& values, double weight);
     //! As above over `n` values starting at `values`.
     bool Update(const double* values, int n, double weight);
