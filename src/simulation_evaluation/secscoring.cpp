@@ -591,8 +591,13 @@ void SECSimulator::FixChartRanges(const std::vector<MCContStats>& inputStats,
             high = std::min(high, input.fTruncMax);
         }
     }
+    std::size_t contIndex = 0;
     for (std::size_t t = 0; t < fvTargets.size() && t < targetStats.size(); ++t) {
         Target& target = fvTargets[t];
+        if (!target.fbCategorical && contIndex < fvContCentre.size()) {
+            const double mean = targetStats[t].GetMean();
+            fvContCentre[contIndex++] = MCMV::IsMissing(mean) ? 0.0 : mean;
+        }
         widen(targetStats[t], target.fChartMin, target.fChartMax);
         if (IsFiniteBound(target.fFilterLow) && !MCMV::IsMissing(target.fChartMin)) {
             target.fChartMin = std::max(target.fChartMin, target.fFilterLow);
@@ -606,6 +611,9 @@ void SECSimulator::FixChartRanges(const std::vector<MCContStats>& inputStats,
 void SECSimulator::CopyTemplatesFrom(const SECSimulator& master) {
     fvInputChartMin = master.fvInputChartMin;
     fvInputChartMax = master.fvInputChartMax;
+    if (master.fvContCentre.size() == fvContCentre.size()) {
+        fvContCentre = master.fvContCentre;
+    }
     MCSP_ASSERT(master.fvTargets.size() == fvTargets.size(),
                 "SECSimulator: a worker's score has the master's targets");
     for (std::size_t t = 0; t < fvTargets.size() && t < master.fvTargets.size(); ++t) {

@@ -8,9 +8,16 @@
 //
 // Contribution to variance. With a second, independent case x', the record that takes x'_k for
 // input k and the case's own values elsewhere gives Y_k. Cov(Y, Y_k) = Var(E[Y | x_−k]), so
-// (V − (E[Y·Y_k] − μ²)) / V = E[Var(Y | x_−k)] / V, the share of the variance that input k
-// accounts for together with its interactions (Sobol's total-effect index; Homma & Saltelli,
-// 1996). For independent inputs of a linear model it is a_k² Var(x_k) / V.
+// (V − Cov(Y, Y_k)) / V = E[Var(Y | x_−k)] / V, the share of the variance that input k accounts
+// for together with its interactions (Sobol's total-effect index; Homma & Saltelli, 1996). For
+// independent inputs of a linear model it is a_k² Var(x_k) / V.
+//
+// Cov(Y, Y_k) is estimated as mean((Y − c)(Y_k − c)) − (μ − c)² with c the target's pilot mean,
+// not as mean(Y·Y_k) − μ²: the two agree when E[Y_k] = μ (independent inputs), but the raw
+// products carry a noise that grows with μ²/V (sevenfold for a mean six standard deviations from
+// 0), and with correlated inputs they make the share change when a constant is added to the
+// target (the term μ·(E[Y_k] − μ)). Centring near μ removes both; Sobol' (2001, Math. Comput.
+// Simul. 55) recommends subtracting an estimate of the mean before forming such products.
 #include "simulation_evaluation/secsimulator.h"
 
 #include "mccommon/mcmv.h"
@@ -32,6 +39,7 @@ void SECSimulator::PrepareSensitivity() {
             fvContTargetPos.push_back(target.fValuePos);
         }
     }
+    fvContCentre.assign(fvContTargetPos.size(), 0.0);
     const std::size_t nCovariates = fvCorrelated.size();
     const std::size_t cells = fvContTargetPos.size() * nCovariates;
     fvPosDiff.assign(cells, MCMV::Missing());
@@ -122,7 +130,9 @@ MCStatus SECSimulator::ComputeCaseSensitivity() {
             }
             for (std::size_t t = 0; t < nTargets; ++t) {
                 const auto tpos = static_cast<std::size_t>(fvContTargetPos[t]);
-                fvProducts[t * nCovariates + k] = fvSavedValues[tpos] * fvScoreValues[tpos];
+                const double c = fvContCentre[t];
+                fvProducts[t * nCovariates + k] =
+                    (fvSavedValues[tpos] - c) * (fvScoreValues[tpos] - c);
             }
             fvWorkInputs[pos] = fvSavedInputs[pos];
         }
@@ -152,9 +162,12 @@ void SECSimulator::AccumulateSensitivity() {
 
 void SECSimulator::CompleteSensitivity() {
     const std::size_t nCovariates = fvCorrelated.size();
-    for (SECContinuousTargetInfo& info : fpOutputStats->GetContTargetInfo()) {
+    std::vector<SECContinuousTargetInfo>& cont = fpOutputStats->GetContTargetInfo();
+    for (std::size_t t = 0; t < cont.size(); ++t) {
+        SECContinuousTargetInfo& info = cont[t];
         const double variance = info.fContStats.GetVariance();
-        const double mean = info.fContStats.GetMean();
+        const double offset =
+            info.fContStats.GetMean() - (t < fvContCentre.size() ? fvContCentre[t] : 0.0);
         info.fvPositiveDelta.assign(nCovariates, MCMV::Missing());
         info.fvNegativeDelta.assign(nCovariates, MCMV::Missing());
         info.fvVarianceContrib.assign(nCovariates, MCMV::Missing());
@@ -170,7 +183,8 @@ void SECSimulator::CompleteSensitivity() {
                 variance > 0.0) {
                 const double meanProduct = info.fvVarianceContribStats[k].GetMean();
                 if (!MCMV::IsMissing(meanProduct)) {
-                    info.fvVarianceContrib[k] = (variance - (meanProduct - mean * mean)) / variance;
+                    info.fvVarianceContrib[k] =
+                        (variance - (meanProduct - offset * offset)) / variance;
                 }
             }
         }

@@ -552,6 +552,9 @@ private:
     std::vector<double> fvWorkInputs;  //!< a variant of the case
     std::vector<double> fvFurther;     //!< the further independent case
     std::vector<int> fvContTargetPos;  //!< value position of each continuous target
+    //! Centre of each continuous target's products in the variance measure: its pilot (or
+    //! start-up) mean, 0 until one is known.
+    std::vector<double> fvContCentre;
 
     MCCommon_800::MCStatus fStatus;     //!< outcome of the last task or preparation
     MCCommon_800::MCWarnings fWarnings; //!< warnings (390015)
