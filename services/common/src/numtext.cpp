@@ -5,6 +5,7 @@
 #include <cstdlib>
 #include <limits>
 #include <sstream>
+#include <string_view>
 
 namespace MCCommon_800 {
 
@@ -46,18 +47,24 @@ bool ParseDouble(const std::string& text, double& out) {
     if (b == e) {
         return false;
     }
-    const std::string t = text.substr(b, e - b);
-    if (t == "INF" || t == "inf" || t == "+INF" || t == "Infinity") {
-        out = std::numeric_limits<double>::infinity();
-        return true;
-    }
-    if (t == "-INF" || t == "-inf" || t == "-Infinity") {
-        out = -std::numeric_limits<double>::infinity();
-        return true;
-    }
-    if (t == "NaN" || t == "nan") {
-        out = std::numeric_limits<double>::quiet_NaN();
-        return true;
+    // Read in place: this runs for every cell of a data file, several times per fit.
+    const std::string_view t(text.data() + b, e - b);
+    const auto isDigitOrPoint = [](char c) { return (c >= '0' && c <= '9') || c == '.'; };
+    const bool numeric = isDigitOrPoint(t[0]) ||
+                         ((t[0] == '+' || t[0] == '-') && t.size() > 1 && isDigitOrPoint(t[1]));
+    if (!numeric) {
+        if (t == "INF" || t == "inf" || t == "+INF" || t == "Infinity") {
+            out = std::numeric_limits<double>::infinity();
+            return true;
+        }
+        if (t == "-INF" || t == "-inf" || t == "-Infinity") {
+            out = -std::numeric_limits<double>::infinity();
+            return true;
+        }
+        if (t == "NaN" || t == "nan") {
+            out = std::numeric_limits<double>::quiet_NaN();
+            return true;
+        }
     }
     // from_chars does not take a leading '+'; strtod would take hex and locale forms.
     const char* first = t.data();
@@ -72,7 +79,7 @@ bool ParseDouble(const std::string& text, double& out) {
     const auto res = std::from_chars(first, last, value);
     if (res.ec == std::errc::result_out_of_range) {
         // Overflow becomes infinity, underflow a signed zero, as strtod does.
-        value = std::strtod(t.c_str(), nullptr);
+        value = std::strtod(std::string(t).c_str(), nullptr);
     } else if (res.ec != std::errc()) {
         return false;
     }
