@@ -699,6 +699,12 @@ bool DFCAccumStatsWeibTwo::FinishComputations(int flag) {
     return true;
 }
 
+void DFCAccumStatsWeibTwo::ReleaseLogCache() {
+    std::vector<double>().swap(fvLogValues);
+    std::vector<double>().swap(fvLogWeights);
+    fbCacheValid = false;
+}
+
 bool DFCAccumStatsWeibTwo::BuildLogCache() {
     if (fbCacheValid) {
         return fbCacheUsable;
@@ -709,6 +715,12 @@ bool DFCAccumStatsWeibTwo::BuildLogCache() {
     fvLogWeights.clear();
     if (!fpEntries) {
         return false;
+    }
+    // Unweighted data keep no weights (every one is 1.0): the cache is 8 bytes per value.
+    const bool weighted = fpWeights != nullptr && !fpWeights->empty();
+    fvLogValues.reserve(static_cast<std::size_t>(fNEntries));
+    if (weighted) {
+        fvLogWeights.reserve(static_cast<std::size_t>(fNEntries));
     }
     fMaxLogValue = -std::numeric_limits<double>::infinity();
     for (std::size_t i = 0; i < static_cast<std::size_t>(fNEntries); ++i) {
@@ -726,7 +738,9 @@ bool DFCAccumStatsWeibTwo::BuildLogCache() {
         }
         const double logV = std::log(v);
         fvLogValues.push_back(logV);
-        fvLogWeights.push_back(w);
+        if (weighted) {
+            fvLogWeights.push_back(w);
+        }
         fMaxLogValue = std::max(fMaxLogValue, logV);
     }
     fbCacheUsable = !fvLogValues.empty();
@@ -748,7 +762,8 @@ double DFCAccumStatsWeibTwo::EvaluateRootFunction(double x) {
     double sumPow = 0.0;
     double sumPowLog = 0.0;
     for (std::size_t i = 0; i < fvLogValues.size(); ++i) {
-        const double term = fvLogWeights[i] * std::exp(x * (fvLogValues[i] - fMaxLogValue));
+        const double weight = fvLogWeights.empty() ? 1.0 : fvLogWeights[i];
+        const double term = weight * std::exp(x * (fvLogValues[i] - fMaxLogValue));
         sumPow += term;
         sumPowLog += term * fvLogValues[i];
     }
@@ -763,12 +778,17 @@ bool DFCAccumStatsWeibTwo::SolveParameters() {
     }
     const double root = FindRoot(theta[1]);
     if (MCMV::IsMissing(root) || !BuildLogCache()) {
+        ReleaseLogCache();
         return FailRootSearch();
     }
     double sumPow = 0.0;
     for (std::size_t i = 0; i < fvLogValues.size(); ++i) {
-        sumPow += fvLogWeights[i] * std::exp(root * (fvLogValues[i] - fMaxLogValue));
+        const double weight = fvLogWeights.empty() ? 1.0 : fvLogWeights[i];
+        sumPow += weight * std::exp(root * (fvLogValues[i] - fMaxLogValue));
     }
+    // The cache is as large as the field; the goodness-of-fit tasks of every field hold their
+    // Weibull at once, so each gives its memory back once solved.
+    ReleaseLogCache();
     const double scale = std::exp(fMaxLogValue + std::log(sumPow / GetEquationWeight()) / root);
     if (!std::isfinite(scale) || !(scale > 0.0)) {
         return FailRootSearch();

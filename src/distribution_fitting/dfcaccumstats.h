@@ -302,6 +302,8 @@ private:
     //! Fills the (ln v, w) cache of the entries with v > 0 and w > 0; false when the data are
     //! unusable (no entry, a weight that does not exist).
     bool BuildLogCache();
+    //! Frees the cache (it is rebuilt when needed again).
+    void ReleaseLogCache();
     //! W of the likelihood equation: the accumulated weight, or the total weight when unset.
     double GetEquationWeight() const { return fAccumWeight > 0.0 ? fAccumWeight : fTotalWeight; }
 
