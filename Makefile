@@ -4,7 +4,7 @@ BUILD_DIR ?= build
 JOBS ?= $(shell nproc)
 CMAKE_FLAGS ?=
 
-.PHONY: deps configure build test sanitize demo bench format clean
+.PHONY: deps configure build test sanitize tsan fuzz demo bench format clean
 
 deps:
 	@bash scripts/install-deps.sh
@@ -23,6 +23,16 @@ sanitize: deps
 	@cmake -S . -B $(BUILD_DIR)-asan -DMCSIM_SANITIZE=address,undefined -DMCSIM_BUILD_BENCH=OFF $(CMAKE_FLAGS) >/dev/null
 	@cmake --build $(BUILD_DIR)-asan -j $(JOBS)
 	@cd $(BUILD_DIR)-asan && ctest --output-on-failure -j $(JOBS)
+
+# The threaded tests under ThreadSanitizer, in their own folder; only the test executables
+# that hold them are built.
+tsan: deps
+	@bash scripts/tsan.sh $(BUILD_DIR)-tsan $(JOBS) $(CMAKE_FLAGS)
+
+# The libFuzzer targets (clang) for FUZZ_SECONDS seconds each, in build-fuzz.
+FUZZ_SECONDS ?= 60
+fuzz: deps
+	@bash scripts/fuzz.sh $(FUZZ_SECONDS)
 
 demo: build
 	@bash scripts/demo.sh $(BUILD_DIR)

@@ -4,6 +4,7 @@
 #include "mccommon/mcmv.h"
 #include "mcmath/mcdistfun.h"
 
+#include <algorithm>
 #include <cmath>
 
 namespace MCMCSP_800 {
@@ -29,19 +30,21 @@ constexpr std::uint16_t kPositiveTypes = Bit(kDistLognormal) | Bit(kDistGamma);
 constexpr std::uint16_t kNonNegativeTypes = Bit(kDistWeibull) | Bit(kDistExponential);
 //! 0 < x < 1.
 constexpr std::uint16_t kUnitTypes = Bit(kDistBeta);
-//! Every type whose support is not the whole line.
-constexpr std::uint16_t kCheckedTypes =
-    kCountTypes | kPositiveTypes | kNonNegativeTypes | kUnitTypes;
 //! A value outside the support of one of these says the covariate is not a count.
 constexpr std::uint16_t kDiscreteMarkTypes = kCountTypes | Bit(kDistLognormal);
 //! Types whose likelihood needs Σ w·ln x.
 constexpr std::uint16_t kLogSumTypes =
     Bit(kDistLognormal) | Bit(kDistWeibull) | Bit(kDistGamma) | Bit(kDistBeta);
 
-//! The types (as bits) whose support excludes x.
+//! Largest whole value a count distribution is tested on: the chi-square test compares the
+//! counts of the values 0, 1, 2, ..., and the category counts stop at this value.
+constexpr double kMaxCountValue = MCMath_800::MCCatStats::kMaxCategory;
+
+//! The types (as bits) whose support excludes x. A count beyond kMaxCountValue is outside the
+//! counts' support here, since it has no category to be counted in.
 std::uint16_t UnsupportedTypes(double x) {
     std::uint16_t failed = 0;
-    if (!(x >= 0.0 && x == std::round(x))) {
+    if (!(x >= 0.0 && x <= kMaxCountValue && x == std::round(x))) {
         failed |= kCountTypes;
     }
     if (!(x > 0.0)) {
@@ -58,6 +61,18 @@ std::uint16_t UnsupportedTypes(double x) {
 
 //! Largest factor value that still has a category code (the code must be countable).
 constexpr double kMaxFactorValue = MCMath_800::MCCatStats::kMaxCategory + 0.5;
+
+//! Pearson's r = Cij / sqrt(Cii·Cjj) from sums of products of deviations. The square roots are
+//! taken apart, so that tiny sums (weights near the smallest double) do not underflow to a zero
+//! divisor and huge ones do not overflow. Missing when a field has no spread or a sum
+//! overflowed; clamped to [-1, 1] against rounding.
+double PearsonFromXProds(double cij, double cii, double cjj) {
+    const double r = cij / (std::sqrt(cii) * std::sqrt(cjj));
+    if (!(cii > 0.0) || !(cjj > 0.0) || !std::isfinite(r)) {
+        return MCMV::Missing();
+    }
+    return std::clamp(r, -1.0, 1.0);
+}
 
 } // namespace
 
@@ -377,6 +392,11 @@ MCStatus DFCAlgorithm::ComputeBasicStats(MultiPassRecordIter& trainData) {
     if (fNValid == 0) {
         return MCStatus(MCSPStatus::kNoData, false);
     }
+    // Weights whose sum overflows (frequency weights near the largest double) leave W, and
+    // with it every mean, count and proportion, without a value: the fitting cannot go on.
+    if (!std::isfinite(fValidWeight) || !std::isfinite(fTotalWeight)) {
+        return MCStatus(MCSPStatus::kLowExpectedOrException, false);
+    }
     FinishFirstPass();
     if (fpFactorTables) {
         fNCells = fpFactorTables->CreateParameterIndices(0);
@@ -411,11 +431,23 @@ void DFCAlgorithm::FinishFirstPass() {
         fvRanges[ui] = maximum - minimum;
         fvSumX[ui] = m * w;
         const double xprod = fpXProds->GetElem(i, i);
-        // The unbiased variance needs W > 1; with less weight it does not exist.
-        fvVariances[ui] = w > 1.0 ? xprod / (w - 1.0) : MCMV::Missing();
-        fvVariancesW[ui] = xprod / w;
+        // The unbiased variance needs W > 1; with less weight it does not exist. Nor does it
+        // when the sum of squared deviations overflowed (values near both ends of the double
+        // range): an infinite variance would pass for a number.
+        const bool spread = std::isfinite(xprod);
+        fvVariances[ui] = spread && w > 1.0 ? xprod / (w - 1.0) : MCMV::Missing();
+        fvVariancesW[ui] = spread ? xprod / w : MCMV::Missing();
         corr.SetElem(i, i, 1.0);
 
+        // Uniform and Triangular distribution functions divide by the range: one that
+        // overflows leaves them without a usable distribution function.
+        if (!std::isfinite(fvRanges[ui])) {
+            for (const DistType type : {kDistTriangular, kDistUniform}) {
+                if (fvAllowedMask[ui] & Bit(type)) {
+                    DropCovarDist(i, type);
+                }
+            }
+        }
         const std::uint16_t mask = fvAllowedMask[ui];
         // A binomial's variance n·p·(1-p) is below its mean n·p.
         if ((mask & Bit(kDistBinomial)) && fvVariances[ui] >= m) {
@@ -449,11 +481,9 @@ void DFCAlgorithm::FinishFirstPass() {
     // correlates with nothing.
     for (int i = 0; i < fNCovariates; ++i) {
         for (int j = 0; j < i; ++j) {
-            const double cii = fpXProds->GetElem(i, i);
-            const double cjj = fpXProds->GetElem(j, j);
             corr.SetElem(i, j,
-                         cii == 0.0 || cjj == 0.0 ? MCMV::Missing()
-                                                  : fpXProds->GetElem(i, j) / std::sqrt(cjj * cii));
+                         PearsonFromXProds(fpXProds->GetElem(i, j), fpXProds->GetElem(i, i),
+                                           fpXProds->GetElem(j, j)));
         }
     }
 }
