@@ -435,9 +435,9 @@ std::string ModelPathForPlan(const std::string& modelPath, const std::string& pl
 
 //! Builds the plan from the fitted fields and the results, with the model file and its
 //! targets. Notes about the plan go to `err`.
-SPCSettings BuildPlan(const FitOptions& options, const DataDictionary& dict,
-                      const std::vector<std::string>& fields, const DFCOutputStats& results,
-                      const FormulaModel* model, std::ostream& err) {
+SPCSettings BuildPlanOf(const FitOptions& options, const DataDictionary& dict,
+                        const std::vector<std::string>& fields, const DFCOutputStats& results,
+                        const FormulaModel* model) {
     SPCSettings plan;
     for (const std::string& name : fields) {
         const DataField& field = dict.GetFields()[static_cast<std::size_t>(dict.FindField(name))];
@@ -459,12 +459,6 @@ SPCSettings BuildPlan(const FitOptions& options, const DataDictionary& dict,
     plan.SetAutoFitType(options.fTest == "ks" ? kKolmogorovSmirnov : kAndersonDarling);
     plan.SetBins(options.fBins);
     plan.SetDFCOutput(results);
-    for (const MCMCSP_800::SimInputSpecs& input : plan.GetSimulationInput()) {
-        if (input.GetDistElementSize() == 0) {
-            err << "mcsim: note: field '" << input.GetVarName()
-                << "' has no fitted distribution; the plan leaves it without one\n";
-        }
-    }
     if (model) {
         plan.SetModel(ModelPathForPlan(options.fModelPath, options.fPlanPath), false);
         for (const FormulaTarget& t : model->GetTargets()) {
@@ -480,6 +474,31 @@ SPCSettings BuildPlan(const FitOptions& options, const DataDictionary& dict,
         }
     }
     return plan;
+}
+
+//! The plan of the fitted fields. A field for which no distribution was fitted is left out
+//! (the plan reader refuses a simulated field without one, so such a plan could be written but
+//! never simulated); its correlations go with it.
+SPCSettings BuildPlan(const FitOptions& options, const DataDictionary& dict,
+                      const std::vector<std::string>& fields, const DFCOutputStats& results,
+                      const FormulaModel* model, std::ostream& err) {
+    SPCSettings plan = BuildPlanOf(options, dict, fields, results, model);
+    std::vector<std::string> kept;
+    for (const MCMCSP_800::SimInputSpecs& input : plan.GetSimulationInput()) {
+        if (input.GetDistElementSize() == 0) {
+            err << "mcsim: note: no distribution could be fitted to field '" << input.GetVarName()
+                << "'; the plan leaves it out\n";
+        } else {
+            kept.push_back(input.GetVarName());
+        }
+    }
+    if (kept.size() == plan.GetSimulationInput().size()) {
+        return plan;
+    }
+    if (kept.empty()) {
+        throw HostError("no distribution could be fitted to any field; no plan is written");
+    }
+    return BuildPlanOf(options, dict, kept, results, model);
 }
 
 //! Reads the model and checks it against the plan's inputs; throws with the model's message.

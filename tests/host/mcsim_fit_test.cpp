@@ -266,6 +266,26 @@ TEST(McsimFit, WritesAPlanThatReadsBack) {
     EXPECT_NE(hosttest::ReadFile(stats).find("<FitStats"), std::string::npos);
 }
 
+TEST(McsimFit, AFieldWithoutAFitIsLeftOutOfThePlan) {
+    // tier is ordinal with fractional values: no distribution fits it, and a simulated field
+    // without one would make the plan unreadable.
+    hosttest::TempDir dir;
+    const std::string plan = dir.File("plan.xml");
+    const CommandRun run = Mcsim(
+        {"fit",
+         std::string(MCSIM_EXAMPLES_DIR) + "/../tests/distribution_fitting/data/fitting_sample.csv",
+         "-o", plan},
+        dir);
+    ASSERT_EQ(run.status, 0) << run.err;
+    EXPECT_NE(run.err.find("field 'tier'; the plan leaves it out"), std::string::npos) << run.err;
+    MCMCSP_800::SPCSettings read;
+    MCMCSP_800::SPCSettings* pRead = &read;
+    MCMCSP_800::MCPlanXMLHandler handler;
+    ASSERT_TRUE(handler.ParsePlanFile(hosttest::ReadFile(plan), pRead));
+    EXPECT_EQ(read.GetSimInput("tier"), nullptr);
+    EXPECT_FALSE(read.GetSimulationInput().empty());
+}
+
 TEST(McsimFit, UnwritablePlanIsReported) {
     hosttest::TempDir dir;
     const CommandRun run = Mcsim({"fit", kSales, "-o", "/no/such/folder/plan.xml"}, dir);
