@@ -4,7 +4,7 @@ BUILD_DIR ?= build
 JOBS ?= $(shell nproc)
 CMAKE_FLAGS ?=
 
-.PHONY: deps configure build test sanitize tsan fuzz demo bench format clean
+.PHONY: deps configure build test sanitize tsan fuzz demo bench compare format clean
 
 deps:
 	@bash scripts/install-deps.sh
@@ -39,6 +39,11 @@ demo: build
 
 bench: build
 	@bash bench/run.sh $(BUILD_DIR)
+
+# mcsim beside its peers (SciPy, R fitdistrplus, NumPy/SciPy, OpenTURNS) on W-FIT-1 and
+# W-SIM-1, one core, in a Release build of its own; installs the peers when missing.
+compare: deps
+	@bash bench/compare.sh $(BUILD_DIR)-release
 
 format:
 	@git ls-files '*.cpp' '*.h' | xargs clang-format -i
