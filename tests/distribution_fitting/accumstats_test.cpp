@@ -1,16 +1,15 @@
-// The likelihood accumulators: the Weibull root search against maximum-likelihood estimates
-// computed independently (data/ml_make_reference.py: real data sets, likelihood equations
-// solved at 40 digits with mpmath and checked against SciPy; the Beta, Gamma and NegBin
-// estimates are checked through BuildModel in optimize_test.cpp), the invariants of the
-// family (analytic scores and Hessians equal finite differences, per-row accumulation equals
-// the sufficient statistics, frequency weights equal repeated rows), the root search's
-// bracketing, rounding and failure paths, and the constraint rows.
+// The likelihood accumulators: the Weibull root search against maximum-likelihood estimates of
+// real data (data/ml_make_reference.py: 40-digit mpmath, checked against SciPy; Beta, Gamma and
+// NegBin are checked through BuildModel in optimize_test.cpp); scores and Hessians against
+// finite differences, rows against sufficient statistics, weights against repeated rows; the
+// root search's bracketing, rounding and failures; the constraint rows.
 #include "component/mcspassert.h"
 #include "distribution_fitting/dfcaccumstats.h"
 #include "distribution_fitting/dfcalgorithm.h"
 #include "distribution_fitting/dfcsettings.h"
 #include "mccommon/mcmv.h"
 
+#include "fit_host.h"
 #include "mctolerance.h"
 
 #include <gtest/gtest.h>
@@ -28,6 +27,7 @@
 
 using namespace MCMCSP_800;
 using namespace MCSPConst;
+using dfctest::ByName;
 using MCCommon_800::MCMV;
 
 namespace {
@@ -36,11 +36,8 @@ namespace {
 struct Sample {
     std::vector<double> fValues;
     std::vector<double> fWeights; //!< one per value (1.0 without weights)
-    double fW = 0.0;
-    double fMean = 0.0;
+    double fW = 0.0, fMean = 0.0, fSumLog = 0.0;
     double fVariance = 0.0; //!< divisor W - 1
-    double fSumLog = 0.0;
-    double fSumLog1m = 0.0;
 };
 
 Sample MakeSample(const mlref::MLCase& c) {
@@ -53,7 +50,6 @@ Sample MakeSample(const mlref::MLCase& c) {
         s.fW += w;
         s.fMean += w * x;
         s.fSumLog += w * std::log(x);
-        s.fSumLog1m += x < 1.0 ? w * std::log1p(-x) : 0.0;
     }
     s.fMean /= s.fW;
     for (std::size_t i = 0; i < s.fValues.size(); ++i) {
@@ -77,9 +73,39 @@ std::vector<DFCGoodFitEntry> SortedEntries(const std::vector<double>& values) {
     return entries;
 }
 
-//! The test name of a table row: its fName.
-template <class Case> std::string NameOf(const ::testing::TestParamInfo<Case>& param) {
-    return param.param.fName;
+//! An accumulator of `type` for one variable with the given totals.
+std::unique_ptr<DFCAccumStats> MakeAccum(DistType type, const DFCSettings& settings,
+                                         std::vector<double>& params, double w, double mean,
+                                         double disp) {
+    const std::vector<int> v{0};
+    switch (type) {
+    case kDistBeta:
+        return std::make_unique<DFCAccumStatsBeta>(settings, params, v, w, std::vector{mean},
+                                                   std::vector{disp});
+    case kDistGamma:
+        return std::make_unique<DFCAccumStatsGamma>(settings, params, v, w, std::vector{mean},
+                                                    std::vector{disp});
+    case kDistNegbinomial:
+        return std::make_unique<DFCAccumStatsNegBin>(settings, params, v, w, std::vector{mean},
+                                                     std::vector{disp});
+    default:
+        return std::make_unique<DFCAccumStatsWeibTwo>(settings, params, v, w, std::vector{mean},
+                                                      std::vector{disp});
+    }
+}
+
+//! The Weibull estimates (scale, shape, location) of the sample `s` whose values are given in
+//! `values` order with `weights` (null: unweighted).
+std::vector<double> SolveWeibull(const Sample& s, const std::vector<double>& values,
+                                 const std::vector<double>* weights,
+                                 const std::vector<double>& minimums = {}) {
+    const std::vector<DFCGoodFitEntry> entries = SortedEntries(values);
+    DFCSettings settings;
+    std::vector<double> p{1.0, 1.0, 0.0};
+    DFCAccumStatsWeibTwo accum(settings, p, {0}, s.fW, {s.fMean}, {s.fVariance}, minimums);
+    accum.SetData(&entries, weights, s.fW, s.fSumLog);
+    EXPECT_TRUE(accum.SolveParameters());
+    return p;
 }
 
 // Gamma and Weibull stop at |F| ≤ 1e-6. Near the root F(x) ≈ F'(x*)·(x - x*), so the shape is
@@ -88,27 +114,19 @@ double ShapeBound(double derivative) {
     return 1.1e-6 / std::fabs(derivative);
 }
 
-// ------------------------------------------------------------------------------------------
-// Weibull: root search against the reference
-
 class WeibullReference : public ::testing::TestWithParam<mlref::MLCase> {};
 
 TEST_P(WeibullReference, RootSearchMatchesMaximumLikelihood) {
     const mlref::MLCase& c = GetParam();
     const Sample s = MakeSample(c);
-    const std::vector<DFCGoodFitEntry> entries = SortedEntries(s.fValues);
-    DFCSettings settings;
-    std::vector<double> params{1.0, 1.0, 0.0};
-    DFCAccumStatsWeibTwo accum(settings, params, {0}, s.fW, {s.fMean}, {s.fVariance}, {0.0});
-    accum.SetData(&entries, c.fpWeights ? &s.fWeights : nullptr, s.fW, s.fSumLog);
-    ASSERT_TRUE(accum.SolveParameters());
+    const std::vector<double> params =
+        SolveWeibull(s, s.fValues, c.fpWeights ? &s.fWeights : nullptr, {0.0});
     EXPECT_EQ(params[2], 0.0); // the location is left alone
 
     // Residual and closed-form scale, evaluated here from the data in long double without the
     // accumulator's rescaling of the powers.
     const long double b = params[1];
-    long double sumPow = 0.0L;
-    long double sumPowLog = 0.0L;
+    long double sumPow = 0.0L, sumPowLog = 0.0L;
     for (std::size_t i = 0; i < s.fValues.size(); ++i) {
         const long double v = s.fValues[i];
         sumPow += s.fWeights[i] * std::pow(v, b);
@@ -125,14 +143,14 @@ TEST_P(WeibullReference, RootSearchMatchesMaximumLikelihood) {
 }
 
 INSTANTIATE_TEST_SUITE_P(RealData, WeibullReference, ::testing::ValuesIn(mlref::kWeibullCases),
-                         NameOf<mlref::MLCase>);
+                         ByName());
 
-// ------------------------------------------------------------------------------------------
-// Objective, scores and Hessian of every accumulator: finite differences and the per-row path
+// Objective, scores and Hessian of every accumulator: finite differences and the per-row path.
 
 //! One accumulator over one data set at a parameter point, with a way to refill it.
 struct LikelihoodCase {
     std::string fName;
+    DistType fType;
     std::vector<double> fParams;  //!< the point at which derivatives are checked
     std::vector<double> fValues;  //!< rows (variable 0)
     std::vector<double> fWeights; //!< frequency weights (variable 1)
@@ -155,30 +173,17 @@ public:
             static_cast<void>(counts.Update(x, wi));
         }
         fEntries = SortedEntries(c.fValues);
-        const std::vector<int> fitVars{0};
-        const std::vector<double> means{sx / w};
-        const std::vector<double> disp{1.0};
-        if (c.fName == "Beta") {
-            auto a =
-                std::make_unique<DFCAccumStatsBeta>(fSettings, fParams, fitVars, w, means, disp);
-            a->SetSumLogXi(slog);
-            a->SetSumLog1MinusXi(slog1m);
-            fpAccum = std::move(a);
-        } else if (c.fName == "Gamma") {
-            auto a =
-                std::make_unique<DFCAccumStatsGamma>(fSettings, fParams, fitVars, w, means, disp);
-            a->SetSumLogXi(slog);
-            fpAccum = std::move(a);
-        } else if (c.fName == "NegBin") {
-            auto a =
-                std::make_unique<DFCAccumStatsNegBin>(fSettings, fParams, fitVars, w, means, disp);
-            a->SetCatStats(counts);
-            fpAccum = std::move(a);
+        fpAccum = MakeAccum(c.fType, fSettings, fParams, w, sx / w, 1.0);
+        if (auto* beta = dynamic_cast<DFCAccumStatsBeta*>(fpAccum.get())) {
+            beta->SetSumLogXi(slog);
+            beta->SetSumLog1MinusXi(slog1m);
+        } else if (auto* gamma = dynamic_cast<DFCAccumStatsGamma*>(fpAccum.get())) {
+            gamma->SetSumLogXi(slog);
+        } else if (auto* negbin = dynamic_cast<DFCAccumStatsNegBin*>(fpAccum.get())) {
+            negbin->SetCatStats(counts);
         } else {
-            auto a =
-                std::make_unique<DFCAccumStatsWeibTwo>(fSettings, fParams, fitVars, w, means, disp);
-            a->SetData(&fEntries, &fCase.fWeights, w, slog);
-            fpAccum = std::move(a);
+            dynamic_cast<DFCAccumStatsWeibTwo&>(*fpAccum).SetData(&fEntries, &fCase.fWeights, w,
+                                                                  slog);
         }
     }
 
@@ -275,20 +280,18 @@ const std::vector<double> kWeights12{1, 2, 1, 3, 1, 1, 2, 1, 4, 1, 2, 1};
 const std::vector<double> kCounts9(kCountRows.begin(), kCountRows.begin() + 9);
 const std::vector<double> kWeights9(kWeights12.begin(), kWeights12.begin() + 9);
 const std::vector<double> kWeights10(kWeights12.begin(), kWeights12.begin() + 10);
-const LikelihoodCase kBetaLik{"Beta", {2.3, 3.1}, kShareRows, kWeights10};
-const LikelihoodCase kGammaLik{"Gamma", {1.7, 0.05}, kCounts9, kWeights9};
-const LikelihoodCase kNegBinLik{"NegBin", {1.4, 0.04, 2.0}, kCountRows, kWeights12};
-const LikelihoodCase kWeibullLik{"Weibull", {30.0, 0.9, 0.0}, kCounts9, kWeights9};
+const LikelihoodCase kBetaLik{"Beta", kDistBeta, {2.3, 3.1}, kShareRows, kWeights10};
+const LikelihoodCase kGammaLik{"Gamma", kDistGamma, {1.7, 0.05}, kCounts9, kWeights9};
+const LikelihoodCase kNegBinLik{
+    "NegBin", kDistNegbinomial, {1.4, 0.04, 2.0}, kCountRows, kWeights12};
+const LikelihoodCase kWeibullLik{"Weibull", kDistWeibull, {30.0, 0.9, 0.0}, kCounts9, kWeights9};
 
 INSTANTIATE_TEST_SUITE_P(Families, LikelihoodDerivatives,
-                         ::testing::Values(kBetaLik, kGammaLik, kNegBinLik, kWeibullLik),
-                         NameOf<LikelihoodCase>);
+                         ::testing::Values(kBetaLik, kGammaLik, kNegBinLik, kWeibullLik), ByName());
 INSTANTIATE_TEST_SUITE_P(Families, RowAccumulation,
-                         ::testing::Values(kGammaLik, kNegBinLik, kWeibullLik),
-                         NameOf<LikelihoodCase>);
+                         ::testing::Values(kGammaLik, kNegBinLik, kWeibullLik), ByName());
 
-// ------------------------------------------------------------------------------------------
-// Weights, order and the root search's failure paths
+// Weights, order and the root search's failure paths.
 
 TEST(WeightedFits, FrequencyWeightsEqualRepeatedRows) {
     // The six age classes of the fair data with their counts against the 6366 rows themselves.
@@ -308,12 +311,7 @@ TEST(WeightedFits, FrequencyWeightsEqualRepeatedRows) {
         ga.SetSumLogXi(s.fSumLog);
         EXPECT_TRUE(ga.SolveParameters());
         gamma.push_back(g);
-        const std::vector<DFCGoodFitEntry> entries = SortedEntries(s.fValues);
-        std::vector<double> wb{1.0, 1.0, 0.0};
-        DFCAccumStatsWeibTwo wa(settings, wb, {0}, s.fW, {s.fMean}, {s.fVariance});
-        wa.SetData(&entries, c.fpWeights ? &s.fWeights : nullptr, s.fW, s.fSumLog);
-        EXPECT_TRUE(wa.SolveParameters());
-        weibull.push_back(wb);
+        weibull.push_back(SolveWeibull(s, s.fValues, c.fpWeights ? &s.fWeights : nullptr));
     }
     // The same bisection on sums that differ by rounding only.
     EXPECT_NEAR_REL(gamma[0][0], gamma[1][0], 1e-9);
@@ -334,16 +332,8 @@ TEST(WeightedFits, WeibullUsesEachEntrysOwnRecordWeight) {
         values.push_back(s.fValues[i]);
         weights.push_back(s.fWeights[i]);
     }
-    DFCSettings settings;
-    std::vector<double> p1{1.0, 1.0, 0.0}, p2{1.0, 1.0, 0.0};
-    const std::vector<DFCGoodFitEntry> e1 = SortedEntries(s.fValues);
-    const std::vector<DFCGoodFitEntry> e2 = SortedEntries(values);
-    DFCAccumStatsWeibTwo a1(settings, p1, {0}, s.fW, {s.fMean}, {s.fVariance});
-    DFCAccumStatsWeibTwo a2(settings, p2, {0}, s.fW, {s.fMean}, {s.fVariance});
-    a1.SetData(&e1, &s.fWeights, s.fW, s.fSumLog);
-    a2.SetData(&e2, &weights, s.fW, s.fSumLog);
-    ASSERT_TRUE(a1.SolveParameters());
-    ASSERT_TRUE(a2.SolveParameters());
+    const std::vector<double> p1 = SolveWeibull(s, s.fValues, &s.fWeights);
+    const std::vector<double> p2 = SolveWeibull(s, values, &weights);
     EXPECT_NEAR_REL(p2[0], p1[0], 1e-12);
     EXPECT_NEAR_REL(p2[1], p1[1], 1e-12);
     EXPECT_NEAR_REL(p1[1], mlref::kWeibullCases[2].fParam2,
@@ -405,7 +395,7 @@ INSTANTIATE_TEST_SUITE_P(
         RootCase{"MissingAtStart", 1.0, [](double) { return MCMV::Missing(); }, 0.0},
         RootCase{"MissingInBisection", 1.0,
                  [](double x) { return x > 1.2 && x < 1.8 ? MCMV::Missing() : 1.5 - x; }, 0.0}),
-    NameOf<RootCase>);
+    ByName());
 
 TEST(RootSearchFailure, StartAtOrBelowZeroEvaluatesNothing) {
     DFCSettings settings;
@@ -473,8 +463,7 @@ TEST(WeibullRootFunction, LargeShapesDoNotOverflow) {
     EXPECT_NEAR_REL(p[0], 1e6, 2e-3);
 }
 
-// ------------------------------------------------------------------------------------------
-// Constraints
+// Constraints.
 
 struct ConstraintCase {
     const char* fName;
@@ -490,32 +479,10 @@ class Constraints : public ::testing::TestWithParam<ConstraintCase> {};
 TEST_P(Constraints, RowsAndOutOfRange) {
     const ConstraintCase& c = GetParam();
     DFCSettings settings;
-    std::vector<double> two{1.0, 1.0};
-    std::vector<double> three{1.0, 0.5, 2.0};
-    std::unique_ptr<DFCAccumStats> accum;
-    switch (c.fType) {
-    case kDistBeta:
-        accum =
-            std::make_unique<DFCAccumStatsBeta>(settings, two, std::vector<int>{0}, 1.0,
-                                                std::vector<double>{0.5}, std::vector<double>{1.0});
-        break;
-    case kDistGamma:
-        accum = std::make_unique<DFCAccumStatsGamma>(settings, two, std::vector<int>{0}, 1.0,
-                                                     std::vector<double>{0.5},
-                                                     std::vector<double>{1.0});
-        break;
-    case kDistNegbinomial:
-        accum = std::make_unique<DFCAccumStatsNegBin>(settings, three, std::vector<int>{0}, 1.0,
-                                                      std::vector<double>{0.5},
-                                                      std::vector<double>{1.0});
-        break;
-    default:
-        accum = std::make_unique<DFCAccumStatsWeibTwo>(settings, three, std::vector<int>{0}, 1.0,
-                                                       std::vector<double>{0.5},
-                                                       std::vector<double>{1.0});
-        break;
-    }
-    EXPECT_EQ(accum->GetNConstr(), c.fType == kDistBeta || c.fType == kDistGamma ? 2 : 3);
+    const bool twoParams = c.fType == kDistBeta || c.fType == kDistGamma;
+    std::vector<double> params = twoParams ? std::vector{1.0, 1.0} : std::vector{1.0, 0.5, 2.0};
+    const auto accum = MakeAccum(c.fType, settings, params, 1.0, 0.5, 1.0);
+    EXPECT_EQ(accum->GetNConstr(), twoParams ? 2 : 3);
     ClearLastAssertion();
     std::vector<double> coeffs;
     double constant = 99.0;
@@ -544,6 +511,6 @@ INSTANTIATE_TEST_SUITE_P(
         ConstraintCase{"WeibullShape", kDistWeibull, 1, true, {0.0, 1.0, 0.0}, -1e-5},
         ConstraintCase{"WeibullLocationFree", kDistWeibull, 2, true, {0.0, 0.0, 0.0}, 0.0},
         ConstraintCase{"WeibullPastEnd", kDistWeibull, 3, false, {}, 0.0}),
-    NameOf<ConstraintCase>);
+    ByName());
 
 } // namespace

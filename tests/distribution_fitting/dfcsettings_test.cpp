@@ -1,6 +1,5 @@
-// The fitting settings: the rules of the registering setters (a table of rejected calls that
-// must leave everything unchanged), the weight variable, the listing of a fresh object, and
-// the results object built from the settings.
+// The fitting settings: rejected setter calls leave everything unchanged, the weight variable,
+// the listing of a fresh object, and the results object built from the settings.
 #include "component/mcspassert.h"
 #include "distribution_fitting/dfcoutputstats.h"
 #include "distribution_fitting/dfcsettings.h"
@@ -56,48 +55,36 @@ TEST_P(RejectedSetters, ReportAndLeaveTheSettingsUnchanged) {
     EXPECT_EQ(State(settings), before);
 }
 
-INSTANTIATE_TEST_SUITE_P(
-    Table, RejectedSetters,
-    ::testing::Values(
-        RejectedCall{
-            "FactorNegativeIndex",
-            [](DFCSettings& s) { return s.AddFactor(-1, 2, {}, kLevelCategorical, false) == -1; },
-            "DFCSettings::AddFactor: varIndex >= 0"},
-        RejectedCall{
-            "FactorNoLevels",
-            [](DFCSettings& s) { return s.AddFactor(6, 0, {}, kLevelCategorical, false) == -1; },
-            "DFCSettings::AddFactor: nLevels >= 1"},
-        RejectedCall{
-            "FactorTwice",
-            [](DFCSettings& s) { return s.AddFactor(1, 2, {}, kLevelCategorical, false) == -1; },
-            "DFCSettings::AddFactor: varIndex is new"},
-        RejectedCall{"CovariateThatIsAFactor",
-                     [](DFCSettings& s) {
-                         return s.AddCovariate(2, {kDistNormal}, kLevelContinuous, false) == -1;
-                     },
-                     "DFCSettings::AddCovariate: varIndex is new"},
-        RejectedCall{
-            "CovariateNegativeIndex",
-            [](DFCSettings& s) { return s.AddCovariate(-3, {}, kLevelContinuous, false) == -1; },
-            "DFCSettings::AddCovariate: varIndex >= 0"},
-        RejectedCall{"SizesOfWrongLength", [](DFCSettings& s) { return !s.SetFactorNCategs({4}); },
-                     "DFCSettings::SetFactorNCategs: fFactors.size() == factorNCategs.size()"},
-        RejectedCall{"SizeZero",
-                     [](DFCSettings& s) {
-                         return !s.SetFactorNCategs({4, 0});
-                     },
-                     "DFCSettings::SetFactorNCategs: factorNCategs[ i ] >= 1"},
-        RejectedCall{
-            "InfosOfWrongLength",
-            [](DFCSettings& s) { return !s.SetFactorVarInfors({DFCSettings::VarInfoElem()}); },
-            "DFCSettings::SetFactorNCategs: fFactors.size() == factorNCategs.size()"},
-        RejectedCall{"WeightNegative", [](DFCSettings& s) { return !s.SetFrequencyWeightVar(-1); },
-                     "varIndex >= 0 in DFCSettings::SetFrequencyWeightVar"},
-        // A rejected weight must not become the weight: the covariate would weigh every record.
-        RejectedCall{"WeightThatIsACovariate",
-                     [](DFCSettings& s) { return !s.SetFrequencyWeightVar(4); },
-                     "Variable must be new in DFCSettings::SetFrequencyWeightVar"}),
+// The call of each row returns true when it reported a rejection.
+#define MC_CALL(expr) [](DFCSettings& s) { return expr; }
+// clang-format off
+INSTANTIATE_TEST_SUITE_P(Table, RejectedSetters, ::testing::Values(
+    RejectedCall{"FactorNegativeIndex",
+                 MC_CALL(s.AddFactor(-1, 2, {}, kLevelCategorical, false) == -1),
+                 "DFCSettings::AddFactor: varIndex >= 0"},
+    RejectedCall{"FactorNoLevels", MC_CALL(s.AddFactor(6, 0, {}, kLevelCategorical, false) == -1),
+                 "DFCSettings::AddFactor: nLevels >= 1"},
+    RejectedCall{"FactorTwice", MC_CALL(s.AddFactor(1, 2, {}, kLevelCategorical, false) == -1),
+                 "DFCSettings::AddFactor: varIndex is new"},
+    RejectedCall{"CovariateThatIsAFactor",
+                 MC_CALL(s.AddCovariate(2, {kDistNormal}, kLevelContinuous, false) == -1),
+                 "DFCSettings::AddCovariate: varIndex is new"},
+    RejectedCall{"CovariateNegativeIndex",
+                 MC_CALL(s.AddCovariate(-3, {}, kLevelContinuous, false) == -1),
+                 "DFCSettings::AddCovariate: varIndex >= 0"},
+    RejectedCall{"SizesOfWrongLength", MC_CALL(!s.SetFactorNCategs({4})),
+                 "DFCSettings::SetFactorNCategs: fFactors.size() == factorNCategs.size()"},
+    RejectedCall{"SizeZero", MC_CALL(!s.SetFactorNCategs({4, 0})),
+                 "DFCSettings::SetFactorNCategs: factorNCategs[ i ] >= 1"},
+    RejectedCall{"InfosOfWrongLength", MC_CALL(!s.SetFactorVarInfors({DFCSettings::VarInfoElem()})),
+                 "DFCSettings::SetFactorNCategs: fFactors.size() == factorNCategs.size()"},
+    RejectedCall{"WeightNegative", MC_CALL(!s.SetFrequencyWeightVar(-1)),
+                 "varIndex >= 0 in DFCSettings::SetFrequencyWeightVar"},
+    // A rejected weight must not become the weight: the covariate would weigh every record.
+    RejectedCall{"WeightThatIsACovariate", MC_CALL(!s.SetFrequencyWeightVar(4)),
+                 "Variable must be new in DFCSettings::SetFrequencyWeightVar"}),
     [](const ::testing::TestParamInfo<RejectedCall>& param) { return param.param.name; });
+// clang-format on
 
 TEST(DFCSettingsFields, SetFactorsStopsAtTheFirstRejection) {
     DFCSettings settings;
@@ -158,9 +145,8 @@ TEST(DFCOutputStatsFresh, OneRecordPerFieldWithTwelveUntestedElements) {
     EXPECT_EQ(results.GetFactorDistInfo()[1].fMeasureLevel, kLevelOrdinal);
     const auto& cov = results.GetCovarDistInfo()[0];
     EXPECT_EQ(cov.fFittedVarName, "x4");
-    EXPECT_EQ(cov.fDistBestType, kDistUnknown);
-    EXPECT_EQ(cov.fDistBestADType, kDistUnknown);
-    EXPECT_EQ(cov.fDistBestKSType, kDistUnknown);
+    EXPECT_TRUE(cov.fDistBestType == kDistUnknown && cov.fDistBestADType == kDistUnknown &&
+                cov.fDistBestKSType == kDistUnknown);
     EXPECT_TRUE(MCCommon_800::MCMV::IsMissing(cov.fBestFitStat));
     ASSERT_EQ(cov.fDistElements.size(), 12U);
     for (int k = 0; k < kNFitDistTypes; ++k) {

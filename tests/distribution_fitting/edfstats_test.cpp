@@ -1,8 +1,7 @@
-// The numeric kernels of the goodness-of-fit step against numbers computed independently
-// (data/gof_make_reference.py: Stephens' A² and D and the distribution functions at 40 digits
-// with mpmath on real data, SciPy for the chi-square and Kolmogorov tails, the series of
-// Anderson and Darling for the limiting A² distribution, the p-value formulas and tables
-// re-implemented from the publications), plus the invariants of weights, ties and blocks.
+// The goodness-of-fit kernels against data/gof_make_reference.py (Stephens' A² and D and the
+// distribution functions at 40 digits on real data, SciPy's chi-square and Kolmogorov tails,
+// Anderson and Darling's series for the limiting A², the p-value formulas and tables from the
+// publications), and the invariants of weights, ties and blocks.
 #include "distribution_fitting/dfcfitgoodness.h"
 #include "mccommon/mcmv.h"
 
@@ -66,8 +65,7 @@ double Sum(const std::vector<double>& v) {
     return std::accumulate(v.begin(), v.end(), 0.0);
 }
 
-// ------------------------------------------------------------------------------------------
-// A² and D against Stephens' formulas at 40 digits
+// A² and D against Stephens' formulas at 40 digits.
 
 class EdfReference : public ::testing::TestWithParam<gofref::EdfCase> {};
 
@@ -115,16 +113,12 @@ TEST(EdfStatistics, IntegerWeightsEqualRepeatedRowsWithTies) {
                     1e-15);
 }
 
-TEST(EdfStatistics, WeightedLowerSideUsesTheWeightBeforeTheJump) {
-    // The EDF is 0 below the first value, whatever its weight: D = |0.6 - 0| = 0.6. The
-    // lower side (C_i - 1)/W = 0.5 would give 0.2.
-    const std::vector<double> u = {0.6, 0.95};
-    const std::vector<double> w = {3.0, 1.0};
-    EXPECT_NEAR_REL(ComputeKolmogorovSmirnov(u.data(), w.data(), 2, 4.0), 0.6, 1e-15);
-}
-
-TEST(EdfStatistics, EntriesAtTheSupportEndsOnlyAdvanceTheWeight) {
-    // Only the middle entry counts: -3 + ((2·1 + 1)/3)·(ln 0.5 - ln 0.5) - 2·ln 0.5.
+TEST(EdfStatistics, WeightedLowerSideAndEntriesAtTheSupportEnds) {
+    // The EDF is 0 below the first value, whatever its weight: D = |0.6 - 0| = 0.6 (the lower
+    // side (C_i - 1)/W = 0.5 would give 0.2).
+    const std::vector<double> v = {0.6, 0.95}, w = {3.0, 1.0};
+    EXPECT_NEAR_REL(ComputeKolmogorovSmirnov(v.data(), w.data(), 2, 4.0), 0.6, 1e-15);
+    // Entries at 0 and 1 only advance the weight: -3 + ((2·1 + 1)/3)·(ln 0.5 - ln 0.5) - 2·ln 0.5.
     const std::vector<double> u = {0.0, 0.5, 1.0};
     const double a2 = ComputeAndersonDarling(u.data(), nullptr, 3, 3.0);
     EXPECT_NEAR_REL(a2, -3.0 + 2.0 * std::log(2.0), 1e-15);
@@ -132,8 +126,7 @@ TEST(EdfStatistics, EntriesAtTheSupportEndsOnlyAdvanceTheWeight) {
     EXPECT_EQ(ComputeEdfSignificance(kDistUniform, 3.0, a2, kMissing, kMissing).fADPValue, 1.0);
 }
 
-// ------------------------------------------------------------------------------------------
-// Distribution functions
+// Distribution functions.
 
 class CdfReference : public ::testing::TestWithParam<gofref::CdfCase> {};
 
@@ -171,8 +164,7 @@ INSTANTIATE_TEST_SUITE_P(
                       BadCdf{"NotContinuous", kDistPoisson, {1.0}}),
     ByName());
 
-// ------------------------------------------------------------------------------------------
-// Significance
+// Significance.
 
 class SignificanceReference : public ::testing::TestWithParam<gofref::SigCase> {};
 
@@ -198,15 +190,13 @@ INSTANTIATE_TEST_SUITE_P(Formulas, SignificanceReference, ::testing::ValuesIn(go
 TEST(Significance, FormulasHitThePublishedCriticalValues) {
     // Upper-tail points of Z* (D'Agostino and Stephens 1986): Normal with estimated mean and
     // variance; Exponential with estimated scale. The formulas approximate the tables.
-    const std::vector<std::pair<double, double>> normal = {
-        {0.631, 0.10}, {0.752, 0.05}, {0.873, 0.025}, {1.035, 0.01}};
-    for (const auto& [z, level] : normal) {
-        EXPECT_NEAR_REL(AndersonDarlingNormalPValue(z), level, 0.03) << z;
-    }
-    const std::vector<std::pair<double, double>> exponential = {
-        {1.062, 0.10}, {1.321, 0.05}, {1.591, 0.025}, {1.959, 0.01}};
-    for (const auto& [z, level] : exponential) {
-        EXPECT_NEAR_REL(AndersonDarlingExponentialPValue(z), level, 0.03) << z;
+    const double levels[] = {0.10, 0.05, 0.025, 0.01};
+    const double normal[] = {0.631, 0.752, 0.873, 1.035},
+                 exponential[] = {1.062, 1.321, 1.591, 1.959};
+    for (int i = 0; i < 4; ++i) {
+        EXPECT_NEAR_REL(AndersonDarlingNormalPValue(normal[i]), levels[i], 0.03) << normal[i];
+        EXPECT_NEAR_REL(AndersonDarlingExponentialPValue(exponential[i]), levels[i], 0.03)
+            << exponential[i];
     }
 }
 
@@ -256,8 +246,7 @@ INSTANTIATE_TEST_SUITE_P(
                       LookUpCase{"MissingValue", kMissing, kCrit, kLevels, kMissing}),
     ByName());
 
-// ------------------------------------------------------------------------------------------
-// Chi-square
+// Chi-square.
 
 class ChiSquareReference : public ::testing::TestWithParam<gofref::ChiCase> {};
 

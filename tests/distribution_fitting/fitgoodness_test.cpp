@@ -1,10 +1,11 @@
-// The goodness-of-fit steps of BuildModel end to end on real data (data/gof_*.csv, numbers
-// from data/gof_make_reference.py): the EDF statistics, p-values and best fit of the Nile
-// flows, the chi-square tests of the visit counts, the Empirical fallbacks, weights against
-// repeated rows, thread-count independence and cancellation.
+// BuildModel's goodness-of-fit steps end to end on real data (data/gof_*.csv, numbers from
+// data/gof_make_reference.py): EDF statistics, p-values and best fit of the Nile flows,
+// chi-square of the visit counts, Empirical fallbacks, weights against repeated rows,
+// thread-count independence and cancellation.
 #include "distribution_fitting/dfcalgorithm.h"
 #include "mccommon/mcmv.h"
 
+#include "fit_host.h"
 #include "mctolerance.h"
 
 #include <gtest/gtest.h>
@@ -26,53 +27,17 @@ constexpr double kMissing = MCCommon_800::MCMV::Missing();
 
 using namespace MCMCSP_800;
 using namespace MCSPConst;
+using namespace dfctest;
 using MCCommon_800::MCMemoryRecordIter;
 using MCCommon_800::MCMV;
-using MCXML_800::MCScaleVar;
-using MCXML_800::MCVarList;
 using MCXML_800::Record;
 using Element = DFCOutputStats::DFCVarDistElement;
-using Rows = std::vector<std::vector<double>>;
 
 namespace {
 
 const std::vector<DistType> kContinuous = {kDistLognormal, kDistNormal,     kDistTriangular,
                                            kDistUniform,   kDistWeibull,    kDistGamma,
                                            kDistBeta,      kDistExponential};
-
-//! One run over `rows` whose variables are all scale variables; the host objects live as long
-//! as the algorithm.
-class FitRun {
-public:
-    FitRun(const Rows& rows, const DFCSettings& settings) : fSettings(settings) {
-        for (std::size_t v = 0; v < rows.at(0).size(); ++v) {
-            fVars.Add(std::make_unique<MCScaleVar>("v" + std::to_string(v)));
-        }
-        for (const auto& row : rows) {
-            fData.Add(Record(row));
-        }
-        fpAlgorithm = std::make_unique<DFCAlgorithm>(fSettings, fVars);
-    }
-    MCStatus Build() { return fpAlgorithm->BuildModel(fData, nullptr); }
-    DFCAlgorithm& Algo() { return *fpAlgorithm; }
-    MCMemoryRecordIter& Data() { return fData; }
-    DFCSettings& Settings() { return fSettings; }
-    const DFCOutputStats::DFCVarDistInfo& Covariate(int i) {
-        return fpAlgorithm->GetOutCovarVarInfo(i);
-    }
-    int CountWarnings(long code) const {
-        const auto& warnings = fpAlgorithm->GetWarnings();
-        return static_cast<int>(std::count_if(warnings.begin(), warnings.end(), [code](auto& s) {
-            return s.GetErrorCode() == code;
-        }));
-    }
-
-private:
-    MCVarList fVars;
-    DFCSettings fSettings;
-    MCMemoryRecordIter fData;
-    std::unique_ptr<DFCAlgorithm> fpAlgorithm;
-};
 
 Rows Column(const std::vector<double>& values) {
     Rows rows;
@@ -116,8 +81,7 @@ std::vector<double> NileBinProportions() {
     return p;
 }
 
-// ------------------------------------------------------------------------------------------
-// The Nile flows: every continuous candidate, both statistics
+// The Nile flows: every continuous candidate, both statistics.
 
 TEST(NileFits, StatisticsPValuesAndBestFit) {
     FitRun run(Column(gofref::kNile),
@@ -210,8 +174,7 @@ TEST(NileFits, IntegerWeightsEqualRepeatedRows) {
     FitRun plain(repeated, settings);
     ASSERT_TRUE(settings.SetFrequencyWeightVar(1));
     FitRun withWeights(weighted, settings);
-    ASSERT_FALSE(plain.Build().IsError());
-    ASSERT_FALSE(withWeights.Build().IsError());
+    ASSERT_FALSE(plain.Build().IsError() || withWeights.Build().IsError());
     for (DistType type : kContinuous) {
         const Element& a = plain.Covariate(0).fDistElements[type];
         const Element& b = withWeights.Covariate(0).fDistElements[type];
@@ -246,36 +209,29 @@ TEST(NileFits, ShiftToNegativeValuesKeepsTheLocationScaleFits) {
     }
 }
 
-// ------------------------------------------------------------------------------------------
-// Special bests and the Empirical fallback of continuous fields
+// Special bests and the Empirical fallback of continuous fields.
 
-TEST(BestFit, TriangularBestHasNoPValueAndNoWarning) {
-    FitRun run(Column(gofref::kNile),
+TEST(BestFit, TriangularHasNoPValueUniformCanBePerfectNoneLeftIsEmpirical) {
+    FitRun tri(Column(gofref::kNile),
                OneCovariate({kDistTriangular}, kLevelContinuous, kAndersonDarling, false));
-    ASSERT_FALSE(run.Build().IsError());
-    const auto& info = run.Covariate(0);
-    EXPECT_EQ(info.fDistBestType, kDistTriangular);
-    EXPECT_NEAR_REL(info.fBestFitStat, NileFit(kDistTriangular).a2, 1e-10);
-    EXPECT_TRUE(MCMV::IsMissing(info.fBestFitPValue));
-    EXPECT_EQ(run.CountWarnings(MCSPStatus::kPoorBestFit), 0);
-    ASSERT_EQ(info.fReportedElements.size(), 2u);
-    EXPECT_TRUE(MCMV::IsMissing(info.fReportedElements[0].fADPValue));
-}
+    ASSERT_FALSE(tri.Build().IsError());
+    EXPECT_EQ(tri.Covariate(0).fDistBestType, kDistTriangular);
+    EXPECT_NEAR_REL(tri.Covariate(0).fBestFitStat, NileFit(kDistTriangular).a2, 1e-10);
+    EXPECT_TRUE(MCMV::IsMissing(tri.Covariate(0).fBestFitPValue));
+    EXPECT_EQ(tri.CountWarnings(MCSPStatus::kPoorBestFit), 0);
+    ASSERT_EQ(tri.Covariate(0).fReportedElements.size(), 2u);
+    EXPECT_TRUE(MCMV::IsMissing(tri.Covariate(0).fReportedElements[0].fADPValue));
 
-TEST(BestFit, UniformWithNonPositiveA2IsAPerfectFit) {
     // u = 0, 1/2, 1: A² = -3 + 2·ln 2 < 0, the best a sample of three can do.
-    FitRun run(Column({1.0, 2.0, 3.0}),
-               OneCovariate({kDistUniform}, kLevelContinuous, kAndersonDarling, false));
-    ASSERT_FALSE(run.Build().IsError());
-    const auto& info = run.Covariate(0);
-    EXPECT_EQ(info.fDistBestType, kDistUniform);
-    EXPECT_NEAR_REL(info.fBestFitStat, -3.0 + 2.0 * std::log(2.0), 1e-15);
-    EXPECT_EQ(info.fBestFitPValue, 1.0);
-    EXPECT_EQ(run.CountWarnings(MCSPStatus::kPoorBestFit), 0);
-}
+    FitRun uniform(Column({1.0, 2.0, 3.0}),
+                   OneCovariate({kDistUniform}, kLevelContinuous, kAndersonDarling, false));
+    ASSERT_FALSE(uniform.Build().IsError());
+    EXPECT_EQ(uniform.Covariate(0).fDistBestType, kDistUniform);
+    EXPECT_NEAR_REL(uniform.Covariate(0).fBestFitStat, -3.0 + 2.0 * std::log(2.0), 1e-15);
+    EXPECT_EQ(uniform.Covariate(0).fBestFitPValue, 1.0);
+    EXPECT_EQ(uniform.CountWarnings(MCSPStatus::kPoorBestFit), 0);
 
-TEST(BestFit, NoCandidateLeftGivesTheHistogramAsEmpirical) {
-    // Beta is the only candidate and the flows lie above 1.
+    // Beta is the only candidate and the flows lie above 1: the histogram is the Empirical best.
     FitRun run(Column(gofref::kNile),
                OneCovariate({kDistBeta}, kLevelContinuous, kAndersonDarling, false));
     ASSERT_FALSE(run.Build().IsError());
@@ -290,8 +246,7 @@ TEST(BestFit, NoCandidateLeftGivesTheHistogramAsEmpirical) {
     EXPECT_EQ(ReportedTypes(info), std::vector<DistType>{kDistEmpirical});
 }
 
-// ------------------------------------------------------------------------------------------
-// Chi-square of the visit counts (an ordinal covariate with frequency weights)
+// Chi-square of the visit counts (an ordinal covariate with frequency weights).
 
 Rows VisitRows() {
     Rows rows;
@@ -358,8 +313,7 @@ TEST(VisitCounts, NothingFitsGivesTheEmpiricalBestAndAWarning) {
     EXPECT_EQ(info.fDistBestParams[1], 77.0);
 }
 
-// ------------------------------------------------------------------------------------------
-// Threads and cancellation
+// Threads and cancellation.
 
 //! The Nile flows beside the first 100 food shares: two covariates, 15 tasks.
 Rows TwoCovariates() {
@@ -388,8 +342,7 @@ TEST(Threads, OneAndTwoThreadsGiveIdenticalResults) {
     MCThread_800::MCStdThreadFactory factory;
     FitRun one(TwoCovariates(), TwoCovariateSettings(1, &factory));
     FitRun two(TwoCovariates(), TwoCovariateSettings(2, &factory));
-    ASSERT_FALSE(one.Build().IsError());
-    ASSERT_FALSE(two.Build().IsError());
+    ASSERT_FALSE(one.Build().IsError() || two.Build().IsError());
     EXPECT_EQ(one.Algo().GetWarnings(), two.Algo().GetWarnings());
     for (int i = 0; i < 2; ++i) {
         const auto& a = one.Covariate(i);
@@ -412,13 +365,6 @@ TEST(Threads, OneAndTwoThreadsGiveIdenticalResults) {
     }
 }
 
-//! The host's cancel query, raised by another thread.
-class FlagQuery : public MCCommon_800::MCQueryCancel {
-public:
-    bool IsCancelled() const override { return fbRaised.load(); }
-    std::atomic<bool> fbRaised{false};
-};
-
 //! Records in memory; on pass `pass` (from 1) another thread cancels: through the algorithm at
 //! the pass's first record, or through the host's query once the pass has no more records.
 class CancelOnPass : public MCCommon_800::MultiPassRecordIter {
@@ -426,7 +372,7 @@ public:
     CancelOnPass(MCMemoryRecordIter& data, int pass, bool viaQuery)
         : fData(data), fPass(pass), fbViaQuery(viaQuery) {}
     DFCAlgorithm* fpAlgorithm = nullptr;
-    FlagQuery fQuery;
+    FlagCancel fQuery;
     bool HasMore() override {
         const bool more = fData.HasMore();
         if (!more && fbViaQuery && fData.GetPassCount() == fPass) {
@@ -458,9 +404,7 @@ TEST_P(Cancel, DuringTheGoodnessOfFitStepEndsWithStatusOne) {
     CancelOnPass data(run.Data(), 3, GetParam());
     data.fpAlgorithm = &run.Algo();
     run.Algo().SetCancelPtr(&data.fQuery);
-    const MCStatus status = run.Algo().BuildModel(data, nullptr);
-    EXPECT_TRUE(status.IsError());
-    EXPECT_EQ(status.GetErrorCode(), MCSPStatus::kCancelled);
+    EXPECT_EQ(run.Algo().BuildModel(data, nullptr), MCStatus(MCSPStatus::kCancelled, false));
     EXPECT_FALSE(run.Algo().IsModelBuilt());
 }
 

@@ -1,13 +1,13 @@
-// The maximum-likelihood step of the fitting (DFCAlgorithm::OptimizeDistParams) through
-// BuildModel on real data against the independent reference of data/ml_make_reference.py;
-// results that do not depend on the number of threads; the runner's thread count;
-// cancellation from another thread; and the data handler's and worker task's failure paths.
+// The maximum-likelihood step (DFCAlgorithm::OptimizeDistParams) through BuildModel on real
+// data against data/ml_make_reference.py; thread-count independence and the runner's threads;
+// cancellation from another thread; the data handler's and worker task's failure paths.
 #include "component/mcspassert.h"
 #include "distribution_fitting/dfcaccumstats.h"
 #include "distribution_fitting/dfcalgorithm.h"
 #include "distribution_fitting/dfcdatahandler.h"
 #include "mccommon/mcmv.h"
 
+#include "fit_host.h"
 #include "mctolerance.h"
 
 #include <boost/math/special_functions/digamma.hpp>
@@ -27,15 +27,12 @@
 
 using namespace MCMCSP_800;
 using namespace MCSPConst;
+using namespace dfctest;
 using MCCommon_800::MCMemoryRecordIter;
 using MCCommon_800::MultiPassRecordIter;
-using MCXML_800::MCScaleVar;
-using MCXML_800::MCVarList;
 using MCXML_800::Record;
 
 namespace {
-
-using Rows = std::vector<std::vector<double>>;
 
 //! A thread factory that records the groups it makes and what they run, and can raise a
 //! cancel from another thread while a group runs.
@@ -85,39 +82,7 @@ private:
     DFCAlgorithm* fpToCancel = nullptr;
 };
 
-//! One fitting run with its host objects.
-class FitHost {
-public:
-    FitHost(const Rows& rows, const std::vector<std::string>& names, DFCSettings settings)
-        : fSettings(std::move(settings)) {
-        for (const std::string& name : names) {
-            fVars.Add(std::make_unique<MCScaleVar>(name));
-        }
-        for (const auto& row : rows) {
-            fData.Add(Record(row));
-        }
-        fpAlgorithm = std::make_unique<DFCAlgorithm>(fSettings, fVars);
-    }
-    MCStatus Build() { return fpAlgorithm->BuildModel(fData, nullptr); }
-    DFCAlgorithm& Algo() { return *fpAlgorithm; }
-    const std::vector<double>& Params(int covariate, DistType type) {
-        return fpAlgorithm->GetOutCovarDistInfo(covariate, type).fDistParams;
-    }
-    int CountWarnings(long code) const {
-        const auto& w = fpAlgorithm->GetWarnings();
-        return static_cast<int>(std::count_if(
-            w.begin(), w.end(), [code](const MCStatus& s) { return s.GetErrorCode() == code; }));
-    }
-
-private:
-    MCVarList fVars;
-    DFCSettings fSettings;
-    MCMemoryRecordIter fData;
-    std::unique_ptr<DFCAlgorithm> fpAlgorithm;
-};
-
-// ------------------------------------------------------------------------------------------
-// Estimates through BuildModel against the reference
+// Estimates through BuildModel against the reference.
 
 struct BuildCase {
     const mlref::MLCase* fpCase;
@@ -160,7 +125,7 @@ TEST_P(BuildModelReference, EstimatesAreMaximumLikelihood) {
     MCThread_800::MCStdThreadFactory factory;
     settings.SetThreadFactory(&factory);
     settings.SetMaxThreadNum(2);
-    FitHost host(rows, {"x", "w"}, settings);
+    FitRun host(rows, settings);
     ASSERT_FALSE(host.Build().IsError());
     const std::vector<double>& p = host.Params(0, bc.fType);
     ASSERT_GE(p.size(), 2u);
@@ -204,8 +169,7 @@ TEST_P(BuildModelReference, EstimatesAreMaximumLikelihood) {
 INSTANTIATE_TEST_SUITE_P(RealData, BuildModelReference, ::testing::ValuesIn(AllBuildCases()),
                          BuildCaseName);
 
-// ------------------------------------------------------------------------------------------
-// Threads
+// Threads.
 
 //! 944 respondents of the election study: age and TV-news days (counts), and age/100 as a
 //! proportion. Five optimisation tasks: NegBin and Gamma of age, NegBin of TV news (Gamma is
@@ -233,12 +197,13 @@ bool SameBits(const std::vector<double>& a, const std::vector<double>& b) {
            (a.empty() || std::memcmp(a.data(), b.data(), a.size() * sizeof(double)) == 0);
 }
 
+// Without a factory the tasks run on the calling thread: the same results again.
 TEST(OptimisationThreads, ResultsDoNotDependOnTheThreadCount) {
     MCThread_800::MCStdThreadFactory factory;
-    FitHost one(AnesRows(), {"age", "tv", "share"}, AnesSettings(&factory, 1));
+    FitRun one(AnesRows(), AnesSettings(&factory, 1));
     ASSERT_FALSE(one.Build().IsError());
-    for (int threads : {2, 4}) {
-        FitHost many(AnesRows(), {"age", "tv", "share"}, AnesSettings(&factory, threads));
+    for (int threads : {2, 4, -2}) {
+        FitRun many(AnesRows(), AnesSettings(threads > 0 ? &factory : nullptr, std::abs(threads)));
         ASSERT_FALSE(many.Build().IsError());
         for (int i = 0; i < 3; ++i) {
             for (DistType type : {kDistNegbinomial, kDistGamma, kDistBeta}) {
@@ -258,7 +223,7 @@ TEST(OptimisationThreads, ResultsDoNotDependOnTheThreadCount) {
 TEST(OptimisationThreads, RunnerGetsAtMostOneThreadPerTask) {
     for (const auto& [maxThreads, expected] : {std::pair<int, int>{8, 5}, {3, 3}, {1, 1}, {0, 1}}) {
         RecordingFactory factory;
-        FitHost host(AnesRows(), {"age", "tv", "share"}, AnesSettings(&factory, maxThreads));
+        FitRun host(AnesRows(), AnesSettings(&factory, maxThreads));
         ASSERT_FALSE(host.Build().IsError());
         const auto optimRun =
             std::find_if(factory.fRuns.begin(), factory.fRuns.end(),
@@ -269,39 +234,22 @@ TEST(OptimisationThreads, RunnerGetsAtMostOneThreadPerTask) {
     }
 }
 
-TEST(OptimisationThreads, NoFactoryRunsOnTheCallingThread) {
-    MCThread_800::MCStdThreadFactory factory;
-    FitHost withFactory(AnesRows(), {"age", "tv", "share"}, AnesSettings(&factory, 2));
-    FitHost without(AnesRows(), {"age", "tv", "share"}, AnesSettings(nullptr, 2));
-    ASSERT_FALSE(withFactory.Build().IsError());
-    ASSERT_FALSE(without.Build().IsError());
-    EXPECT_TRUE(SameBits(withFactory.Params(2, kDistBeta), without.Params(2, kDistBeta)));
-}
-
 TEST(OptimisationCancel, CancelFromAnotherThreadEndsTheStepWithStatusOne) {
     RecordingFactory factory;
     DFCSettings settings = AnesSettings(&factory, 2);
-    FitHost host(AnesRows(), {"age", "tv", "share"}, settings);
+    FitRun host(AnesRows(), settings);
     factory.CancelDuringOptimisation(&host.Algo());
-    const MCStatus status = host.Build();
-    EXPECT_EQ(status, MCStatus(MCSPStatus::kCancelled, false));
+    EXPECT_EQ(host.Build(), MCStatus(MCSPStatus::kCancelled, false));
     EXPECT_FALSE(host.Algo().IsModelBuilt());
     // The step ran its tasks once and stopped there: no goodness-of-fit group followed.
     ASSERT_EQ(factory.fRuns.size(), 1u);
     EXPECT_EQ(factory.fRuns[0].fNOptimTasks, 5);
 }
 
-//! A host cancel query that answers true once armed; polled from worker threads.
-class ArmedCancel : public MCCommon_800::MCQueryCancel {
-public:
-    bool IsCancelled() const override { return fbArmed.load(); }
-    std::atomic<bool> fbArmed{false};
-};
-
 TEST(OptimisationCancel, PendingCancelStopsTheBetaOptimiser) {
     // Armed before the build, the first pass stops at once; so arm it only for the
     // optimiser's handler, which is the only one that polls during this step.
-    ArmedCancel cancel;
+    FlagCancel cancel;
     DFCSettings settings;
     ASSERT_EQ(settings.AddCovariate(0, {kDistBeta}, kLevelContinuous, false), 1);
     settings.SetCancelPointer(&cancel);
@@ -314,7 +262,7 @@ TEST(OptimisationCancel, PendingCancelStopsTheBetaOptimiser) {
     DFCDataHandler handler(nullptr, &info, &warnings);
     handler.SetAccumStats(&accum);
     EXPECT_TRUE(handler.ComputeStatsForOptimizer(MCMath_800::kOptCompScores).IsOK());
-    cancel.fbArmed = true;
+    cancel.fbRaised = true;
     EXPECT_EQ(handler.ComputeStatsForOptimizer(MCMath_800::kOptCompScores),
               MCStatus(MCSPStatus::kCancelled, false));
     EXPECT_TRUE(info.IsCancel());
@@ -325,8 +273,7 @@ TEST(OptimisationCancel, PendingCancelStopsTheBetaOptimiser) {
     EXPECT_EQ(params, (std::vector<double>{2.0, 3.0}));
 }
 
-// ------------------------------------------------------------------------------------------
-// Collection rules
+// Collection rules.
 
 TEST(OptimisationCollection, NegBinOfAContinuousCovariateIsDropped) {
     // Whole numbers at the continuous level have no category counts.
@@ -336,7 +283,7 @@ TEST(OptimisationCollection, NegBinOfAContinuousCovariateIsDropped) {
     }
     DFCSettings settings;
     ASSERT_EQ(settings.AddCovariate(0, {kDistNegbinomial, kDistGamma}, kLevelContinuous, false), 1);
-    FitHost host(rows, {"x"}, settings);
+    FitRun host(rows, settings);
     ASSERT_FALSE(host.Build().IsError());
     EXPECT_FALSE(host.Algo().GetOutCovarDistInfo(0, kDistNegbinomial).fbDistAllowed);
     EXPECT_GE(host.CountWarnings(MCSPStatus::kDistDropped), 1);
@@ -354,15 +301,14 @@ TEST(OptimisationCollection, FailedRootSearchKeepsTheMomentEstimate) {
     }
     DFCSettings settings;
     ASSERT_EQ(settings.AddCovariate(0, {kDistNegbinomial}, kLevelOrdinal, false), 1);
-    FitHost host(rows, {"x"}, settings);
+    FitRun host(rows, settings);
     ASSERT_FALSE(host.Build().IsError());
     const auto& element = host.Algo().GetOutCovarDistInfo(0, kDistNegbinomial);
     EXPECT_EQ(element.fDistParams, element.fInitParams);
     EXPECT_EQ(host.CountWarnings(MCSPStatus::kRootSearchFailed), 0);
 }
 
-// ------------------------------------------------------------------------------------------
-// The data handler and the worker task
+// The data handler and the worker task.
 
 //! Records whose restart fails, or whose fetch fails.
 class FaultyRecords : public MultiPassRecordIter {

@@ -1,14 +1,9 @@
-// Input generation: every distribution type's draws against its own distribution function, the
-// exact discrete inverse, the stored parameters, moments and ranges, unusable plans, and the
-// simulator's truncation, categorical and contingency-table draws, sensitivity iterations and
-// seeding.
-//
-// Random output uses fixed seeds. Each goodness-of-fit check is set to fail with probability at
-// most 1e-6 for a correct generator under a random seed: Kolmogorov-Smirnov through the
-// Dvoretzky-Kiefer-Wolfowitz inequality with Massart's constant, P(sup|F_n − F| > ε) ≤
-// 2·exp(−2nε²) (Massart 1990), and Pearson's chi-square with cells of expected count ≥ 20 at
-// the upper 1e-6 point. The reference distribution functions are Boost.Math's distributions,
-// called directly, not through the generator's transforms or prepared quantiles.
+// Input generation: draws of every type against Boost.Math's distribution functions (called
+// directly), the exact discrete inverse, stored parameters, moments and ranges, unusable plans,
+// and the simulator's truncation, categories, contingency tables, sensitivity and seeding.
+// Fixed seeds; each goodness-of-fit check fails with probability at most 1e-6 for a correct
+// generator: Kolmogorov-Smirnov by the DKW inequality P(sup|F_n − F| > ε) ≤ 2·exp(−2nε²)
+// (Massart 1990), Pearson's chi-square with expected cell counts ≥ 20 at the upper 1e-6 point.
 #include "simulation_evaluation/secgeneration.h"
 #include "simulation_evaluation/secsimulator.h"
 
@@ -145,22 +140,23 @@ std::function<double(double)> StepCdf(std::vector<double> cumulative) {
     };
 }
 
+template <class Row> std::string ByName(const ::testing::TestParamInfo<Row>& row) {
+    return row.param.fName;
+}
+
 double Phi(double z) {
     return bm::cdf(bm::normal(), z);
 }
 
 struct FitCase {
     const char* fName;
+    friend std::ostream& operator<<(std::ostream& os, const FitCase& r) { return os << r.fName; }
     DistType fType;
     std::vector<double> fParams;        //!< stored vector
     bool fbDiscrete;                    //!< chi-square rather than KS
     std::function<double(double)> fCdf; //!< reference distribution function
     double fOffset = 0.0;               //!< discrete: values are offset + k
 };
-
-void PrintTo(const FitCase& row, std::ostream* os) {
-    *os << row.fName;
-}
 
 class GoodnessOfFit : public ::testing::TestWithParam<FitCase> {};
 
@@ -204,10 +200,10 @@ INSTANTIATE_TEST_SUITE_P(EveryType, GoodnessOfFit, ::testing::Values(
     FitCase{"NegBinLongTail", kDistNegbinomial, {0.02, 0.002, 0.0}, true, [](double k) { return bm::cdf(bm::negative_binomial(0.02, 0.002), k); }},
     FitCase{"Bernoulli", kDistBernoulli, {0.3}, true, [](double k) { return bm::cdf(bm::bernoulli(0.3), k); }},
     FitCase{"EmpiricalBins", kDistEmpirical, {0.0, 10.0, 2.7, 0.0, 0.1, 0.2, 0.4, 0.3}, true, StepCdf({0.1, 0.3, 0.7})}),
-    [](const ::testing::TestParamInfo<FitCase>& row) { return std::string(row.param.fName); });
+    ByName<FitCase>);
 // clang-format on
 
-// ---- The exact discrete inverse ----------------------------------------------------------------
+// The exact discrete inverse.
 
 TEST(DiscreteInverse, PoissonAndNegBinAreTheSmallestWholeNumberAboveU) {
     MCMath_800::MCURandom stream(7u);
@@ -249,11 +245,11 @@ TEST(DiscreteInverse, PreparedTableAgreesWithTheSearch) {
     }
 }
 
-// ---- Moments, ranges and stored parameters
-// -------------------------------------------------------
+// Moments, ranges and stored parameters.
 
 struct MomentCase {
     const char* fName;
+    friend std::ostream& operator<<(std::ostream& os, const MomentCase& r) { return os << r.fName; }
     DistType fType;
     std::vector<double> fParams;
     double fMean; //!< from Boost's distribution, or by hand where stated
@@ -261,10 +257,6 @@ struct MomentCase {
     double fLower; //!< missing when unbounded
     double fUpper;
 };
-
-void PrintTo(const MomentCase& row, std::ostream* os) {
-    *os << row.fName;
-}
 
 class Moments : public ::testing::TestWithParam<MomentCase> {};
 
@@ -299,7 +291,7 @@ INSTANTIATE_TEST_SUITE_P(EveryType, Moments, ::testing::Values(
     // Bin centres 1.25, 3.75, 6.25, 8.75 with shares 0.1, 0.2, 0.4, 0.3: mean 6.
     MomentCase{"Empirical", kDistEmpirical, {0.0, 10.0, 2.7, 1.0, 0.1, 0.2, 0.4, 0.3}, 6.0, 2.7, 0.0, 10.0},
     MomentCase{"UserRanges", kDistUserRanges, {5.0, 0.0, 10.0, 20.0, 0.5, 0.5}, kNone, kNone, 0.0, 20.0}),
-    [](const ::testing::TestParamInfo<MomentCase>& row) { return std::string(row.param.fName); });
+    ByName<MomentCase>);
 // clang-format on
 
 TEST(StoredParams, PlacedInTheOrderOfTheTypesNames) {
@@ -322,12 +314,11 @@ TEST(StoredParams, PlacedInTheOrderOfTheTypesNames) {
 
 struct BadParamsCase {
     const char* fName;
+    friend std::ostream& operator<<(std::ostream& os, const BadParamsCase& r) {
+        return os << r.fName;
+    }
     DistInfoElem fDist;
 };
-
-void PrintTo(const BadParamsCase& row, std::ostream* os) {
-    *os << row.fName;
-}
 
 class BadStoredParams : public ::testing::TestWithParam<BadParamsCase> {};
 
@@ -359,19 +350,16 @@ INSTANTIATE_TEST_SUITE_P(
                       MakeDist(kDistEmpirical, {{"min", 0.0}, {"max", 1.0}, {"stddev", 1.0}})},
         BadParamsCase{"Categorical", MakeCategorical({"a"}, {1.0})},
         BadParamsCase{"NoDistribution", DistInfoElem()}),
-    [](const ::testing::TestParamInfo<BadParamsCase>& row) {
-        return std::string(row.param.fName);
-    });
+    ByName<BadParamsCase>);
 
 struct BadValuesCase {
     const char* fName;
+    friend std::ostream& operator<<(std::ostream& os, const BadValuesCase& r) {
+        return os << r.fName;
+    }
     DistType fType;
     std::vector<double> fParams;
 };
-
-void PrintTo(const BadValuesCase& row, std::ostream* os) {
-    *os << row.fName;
-}
 
 class BadParamValues : public ::testing::TestWithParam<BadValuesCase> {};
 
@@ -381,27 +369,25 @@ TEST_P(BadParamValues, GiveAnUnusableGeneratorThatDrawsMissing) {
     EXPECT_TRUE(MCMV::IsMissing(SECTransform(gen, 0.3)));
 }
 
-INSTANTIATE_TEST_SUITE_P(
-    OutsideTheirDomain, BadParamValues,
-    ::testing::Values(BadValuesCase{"NormalNegativeSd", kDistNormal, {0.0, -1.0}},
-                      BadValuesCase{"NormalNotFinite", kDistNormal, {kNone, 1.0}},
-                      BadValuesCase{"GammaZeroShape", kDistGamma, {0.0, 1.0}},
-                      BadValuesCase{"BetaZeroShape", kDistBeta, {2.0, 0.0}},
-                      BadValuesCase{"TriangularModeOutside", kDistTriangular, {0.0, 1.0, 2.0}},
-                      BadValuesCase{"UniformReversed", kDistUniform, {1.0, 0.0}},
-                      BadValuesCase{"PoissonZeroMean", kDistPoisson, {0.0}},
-                      BadValuesCase{"NegBinZeroProb", kDistNegbinomial, {2.0, 0.0, 0.0}},
-                      BadValuesCase{"BinomialProbAboveOne", kDistBinomial, {5.0, 1.5}},
-                      BadValuesCase{"ExponentialZeroRate", kDistExponential, {0.0}},
-                      BadValuesCase{"WeibullZeroShape", kDistWeibull, {1.0, 0.0, 0.0}},
-                      BadValuesCase{
-                          "EmpiricalNoMass", kDistEmpirical, {0.0, 1.0, 1.0, 1.0, 0.0, 0.0}},
-                      BadValuesCase{"UserRangesReversed", kDistUserRanges, {2.0, 1.0, 1.0}},
-                      BadValuesCase{"WrongLength", kDistLognormal, {1.0}},
-                      BadValuesCase{"Unknown", kDistUnknown, {1.0}}),
-    [](const ::testing::TestParamInfo<BadValuesCase>& row) {
-        return std::string(row.param.fName);
-    });
+// clang-format off
+INSTANTIATE_TEST_SUITE_P(OutsideTheirDomain, BadParamValues, ::testing::Values(
+    BadValuesCase{"NormalNegativeSd", kDistNormal, {0.0, -1.0}},
+    BadValuesCase{"NormalNotFinite", kDistNormal, {kNone, 1.0}},
+    BadValuesCase{"GammaZeroShape", kDistGamma, {0.0, 1.0}},
+    BadValuesCase{"BetaZeroShape", kDistBeta, {2.0, 0.0}},
+    BadValuesCase{"TriangularModeOutside", kDistTriangular, {0.0, 1.0, 2.0}},
+    BadValuesCase{"UniformReversed", kDistUniform, {1.0, 0.0}},
+    BadValuesCase{"PoissonZeroMean", kDistPoisson, {0.0}},
+    BadValuesCase{"NegBinZeroProb", kDistNegbinomial, {2.0, 0.0, 0.0}},
+    BadValuesCase{"BinomialProbAboveOne", kDistBinomial, {5.0, 1.5}},
+    BadValuesCase{"ExponentialZeroRate", kDistExponential, {0.0}},
+    BadValuesCase{"WeibullZeroShape", kDistWeibull, {1.0, 0.0, 0.0}},
+    BadValuesCase{"EmpiricalNoMass", kDistEmpirical, {0.0, 1.0, 1.0, 1.0, 0.0, 0.0}},
+    BadValuesCase{"UserRangesReversed", kDistUserRanges, {2.0, 1.0, 1.0}},
+    BadValuesCase{"WrongLength", kDistLognormal, {1.0}},
+    BadValuesCase{"Unknown", kDistUnknown, {1.0}}),
+    ByName<BadValuesCase>);
+// clang-format on
 
 TEST(CumulativeTable, NormalisedToItsTotalAndEndingAtOne) {
     std::vector<double> table;
@@ -428,7 +414,7 @@ TEST(Transform, TailsStayFiniteAndOverflowIsMissing) {
     EXPECT_TRUE(MCMV::IsMissing(SECTransform(exponential, MCMV::Missing())));
 }
 
-// ---- The simulator: cases, bounds, categories -------------------------------------------------
+// The simulator: cases, bounds, categories.
 
 TEST(SimulatorCases, TruncationNeverLetsAValueOutside) {
     TestPlan t;

@@ -11,6 +11,7 @@
 #include <limits>
 #include <numeric>
 #include <random>
+#include <string>
 #include <vector>
 
 using MCCommon_800::MCMV;
@@ -21,8 +22,7 @@ namespace {
 constexpr double kNaN = std::numeric_limits<double>::quiet_NaN();
 constexpr double kInf = std::numeric_limits<double>::infinity();
 
-// Two-pass references in long double for the one-pass updates: the weighted mean, and the
-// cross product Σ w·(a - mean_a)·(b - mean_b) (M2 when a = b).
+// Two-pass references in long double: the weighted mean, and Σ w·(a - mean_a)·(b - mean_b).
 long double Mean(const std::vector<double>& x, const std::vector<double>& w) {
     long double sw = 0.0L, swx = 0.0L;
     for (std::size_t i = 0; i < x.size(); ++i) {
@@ -49,10 +49,13 @@ void ExpectNearAll(const std::vector<double>& a, const std::vector<double>& b, d
     }
 }
 
-// Two identities at once: pooling k random parts equals one pass, and a row of weight r·w equals
-// r rows of weight w (the one pass takes the former, the parts the latter); both match the
-// two-pass reference. The results differ only in the order of rounding errors (O(n·eps) at
-// worst for these well-conditioned data), hence 1e-12 relative.
+template <class Row> std::string ByName(const ::testing::TestParamInfo<Row>& p) {
+    return p.param.fName;
+}
+
+// Pooling k random parts equals one pass, and a row of weight r·w equals r rows of weight w (the
+// one pass takes the former, the parts the latter); both match the two-pass reference. Only the
+// order of rounding differs (O(n·eps) for these well-conditioned data): 1e-12 relative.
 class PoolSplit : public ::testing::TestWithParam<int> {};
 
 TEST_P(PoolSplit, PooledPartsOfRepeatedRowsEqualOneWeightedPass) {
@@ -97,7 +100,6 @@ TEST_P(PoolSplit, PooledPartsOfRepeatedRowsEqualOneWeightedPass) {
         pooledCat.Pool(cat[p]);
         ASSERT_TRUE(pooledHist.Merge(hist[p]) && merged.Merge(pm[p]));
     }
-
     const auto mean = static_cast<double>(Mean(x, w));
     const double m2 = XProd(x, x, w);
     const double sumW = std::accumulate(w.begin(), w.end(), 0.0L);
@@ -107,8 +109,7 @@ TEST_P(PoolSplit, PooledPartsOfRepeatedRowsEqualOneWeightedPass) {
         EXPECT_NEAR_REL(r->GetSumFreqWeights(), sumW, 1e-12);
         EXPECT_NEAR_REL(r->GetMean(), mean, 1e-12);
         EXPECT_NEAR_REL(r->GetVariance(), m2 / (sumW - 1.0), 1e-12);
-        double lo = 0.0;
-        double hi = 0.0;
+        double lo = 0.0, hi = 0.0;
         ASSERT_TRUE(r->GetExtrema(lo, hi));
         EXPECT_EQ(lo, *std::min_element(x.begin(), x.end()));
         EXPECT_EQ(hi, *std::max_element(x.begin(), x.end()));
@@ -129,18 +130,16 @@ TEST_P(PoolSplit, PooledPartsOfRepeatedRowsEqualOneWeightedPass) {
 
 INSTANTIATE_TEST_SUITE_P(Parts, PoolSplit, ::testing::Values(2, 3, 7, 16));
 
-// Data y = 1e9 + u, sd(u) = 1, keep their variance: the reference is the exact variance of
-// those doubles (y - 1e9 is exact). Sums of raw powers would lose every digit (Σy² ≈ 1e21);
-// West's update loses at most log10(|mean|/sd) = 9 digits, in practice about 8 (errors of the
-// running mean cancel), so 1e-6 fails any raw-power method by many orders. The running mean
-// carries ulp(1e9)/2 per update, a random walk of about 1e-5: 1e-13 of the mean.
+// y = 1e9 + u, sd(u) = 1: the reference is the exact variance of those doubles (y - 1e9 is
+// exact). Raw power sums lose every digit (Σy² ≈ 1e21); West's update loses at most
+// log10(|mean|/sd) = 9 digits, about 8 in practice, so 1e-6 fails any raw-power method by
+// orders. The running mean carries ulp(1e9)/2 per update, a random walk of 1e-13 of the mean.
 TEST(AccumulatorShift, DataShiftedBy1e9KeepTheirVariance) {
     constexpr double kShift = 1e9;
     std::mt19937_64 gen(4242);
     std::normal_distribution<double> normal(0.0, 1.0);
     std::vector<double> u;
-    MCContStats stats;
-    MCContStats halves[2];
+    MCContStats stats, halves[2];
     MCProvMeans means(2, true);
     for (int i = 0; i < 100000; ++i) {
         const double y = kShift + normal(gen);
@@ -162,8 +161,7 @@ TEST(AccumulatorShift, DataShiftedBy1e9KeepTheirVariance) {
 
 TEST(MCContStats, EmptyAndSingleValueReportMissing) {
     MCContStats s;
-    double lo = 0.0;
-    double hi = 0.0;
+    double lo = 0.0, hi = 0.0;
     EXPECT_FALSE(s.GetExtrema(lo, hi));
     EXPECT_TRUE(MCMV::IsMissing(lo) && MCMV::IsMissing(hi) && MCMV::IsMissing(s.GetMean()));
     s.Update(7.0);
@@ -179,8 +177,7 @@ TEST(MCContStats, EmptyAndSingleValueReportMissing) {
 // Bad input leaves every accumulator unchanged.
 struct BadUpdate {
     const char* fName;
-    double fX;
-    double fWeight;
+    double fX, fWeight;
 };
 
 class RefusedUpdate : public ::testing::TestWithParam<BadUpdate> {};
@@ -208,13 +205,10 @@ INSTANTIATE_TEST_SUITE_P(Table, RefusedUpdate, ::testing::Values(
     BadUpdate{"MissingValue", kNaN, 1.0}, BadUpdate{"InfiniteValue", kInf, 1.0},
     BadUpdate{"MinusInfinity", -kInf, 1.0}, BadUpdate{"ZeroWeight", 2.0, 0.0},
     BadUpdate{"NegativeWeight", 2.0, -1.0}, BadUpdate{"MissingWeight", 2.0, kNaN},
-    BadUpdate{"InfiniteWeight", 2.0, kInf}),
-    [](const ::testing::TestParamInfo<BadUpdate>& p) { return p.param.fName; });
+    BadUpdate{"InfiniteWeight", 2.0, kInf}), ByName<BadUpdate>);
 // clang-format on
 
-// ------------------------------------------------------------------------------------------
 // MCCatStats: the category of a value, -1 when refused.
-
 struct CatCase {
     const char* fName;
     double fValue;
@@ -242,7 +236,7 @@ INSTANTIATE_TEST_SUITE_P(Table, CatStatsCategory, ::testing::Values(
     CatCase{"Infinite", kInf, -1},
     CatCase{"LargestCategory", MCCatStats::kMaxCategory, MCCatStats::kMaxCategory},
     CatCase{"BeyondLargest", MCCatStats::kMaxCategory + 1.0, -1}, CatCase{"Huge", 1e300, -1}),
-    [](const ::testing::TestParamInfo<CatCase>& p) { return p.param.fName; });
+    ByName<CatCase>);
 // clang-format on
 
 TEST(MCCatStats, GapsCountAsEmptyCategories) {
@@ -252,28 +246,19 @@ TEST(MCCatStats, GapsCountAsEmptyCategories) {
     s.Update(4.2, 1.0);
     EXPECT_EQ(s.GetCatCounts(), (std::vector<double>{1.0, 0.0, 0.0, 0.0, 3.0}));
     EXPECT_EQ(s.GetNCategories(false), 2);
-    EXPECT_EQ(s.GetCatCount(7), 0.0);
-    EXPECT_EQ(s.GetCatCount(-1), 0.0);
+    EXPECT_TRUE(s.GetCatCount(7) == 0.0 && s.GetCatCount(-1) == 0.0);
     s.Pool(s);
-    EXPECT_EQ(s.GetCatCount(4), 6.0);
-    EXPECT_EQ(s.GetSumCounts(), 8.0);
+    EXPECT_TRUE(s.GetCatCount(4) == 6.0 && s.GetSumCounts() == 8.0);
 }
 
-// ------------------------------------------------------------------------------------------
-// MCMeansXProdData::Merge
-
 TEST(MCMeansXProdData, MergeRefusesAMismatchAndKeepsItsState) {
-    MCProvMeans three(3, true);
+    MCProvMeans three(3, true), two(2, true), meansOnly(3, false);
     three.Update(std::vector<double>{1.0, 2.0, 3.0}, 1.0);
     three.Update(std::vector<double>{2.0, 0.0, 5.0}, 2.0);
     const MCProvMeans before = three;
-    MCProvMeans two(2, true);
     two.Update(std::vector<double>{1.0, 2.0}, 1.0);
-    MCProvMeans meansOnly(3, false);
     meansOnly.Update(std::vector<double>{1.0, 2.0, 3.0}, 1.0);
-    EXPECT_FALSE(three.Merge(two));
-    EXPECT_FALSE(two.Merge(three));
-    EXPECT_FALSE(three.Merge(meansOnly));
+    EXPECT_FALSE(three.Merge(two) || two.Merge(three) || three.Merge(meansOnly));
     EXPECT_FALSE(three.Update(std::vector<double>{1.0, 2.0}, 1.0)); // row of the wrong length
     EXPECT_EQ(three.GetCount(), before.GetCount());
     EXPECT_EQ(three.GetMeans(), before.GetMeans());
@@ -284,24 +269,20 @@ TEST(MCMeansXProdData, MergeRefusesAMismatchAndKeepsItsState) {
     EXPECT_TRUE(empty.Merge(three));
     EXPECT_EQ(empty.GetMeans(), three.GetMeans());
     EXPECT_TRUE(empty.GetXProds() == three.GetXProds());
-}
 
-TEST(MCMeansXProdData, MergeWithItselfDoublesTheWeights) {
+    // Merging with itself doubles the weights. Two rows: means (2, 2), C = [[2, -4], [-4, 8]].
     MCProvMeans pm(2, true);
     pm.Update(std::vector<double>{1.0, 4.0}, 1.0);
     pm.Update(std::vector<double>{3.0, 0.0}, 1.0);
-    // Two rows: means (2, 2), C = [[2, -4], [-4, 8]].
     ASSERT_TRUE(pm.Merge(pm));
     EXPECT_EQ(pm.GetSumWeights(), 4.0);
     EXPECT_EQ(pm.GetMeans(), (std::vector<double>{2.0, 2.0}));
-    EXPECT_EQ(pm.GetXProds().GetElem(0, 0), 4.0);
-    EXPECT_EQ(pm.GetXProds().GetElem(1, 0), -8.0);
-    EXPECT_EQ(pm.GetXProds().GetElem(1, 1), 16.0);
+    const MCSymMatrix& c = pm.GetXProds();
+    EXPECT_EQ((std::vector<double>{c.GetElem(0, 0), c.GetElem(1, 0), c.GetElem(1, 1)}),
+              (std::vector<double>{4.0, -8.0, 16.0}));
 }
 
-// ------------------------------------------------------------------------------------------
 // MCHistogramData: where a value goes (-1 underflow, 10 overflow).
-
 struct BinCase {
     const char* fName;
     double fX;
@@ -327,15 +308,13 @@ INSTANTIATE_TEST_SUITE_P(Table, HistogramBin, ::testing::Values(
     BinCase{"Minimum", 0.0, 0}, BinCase{"InsideFirst", 0.999, 0}, BinCase{"Edge", 1.0, 1},
     BinCase{"Middle", 5.5, 5}, BinCase{"JustBelowMaximum", 9.999, 9},
     BinCase{"MaximumInLastBin", 10.0, 9}, BinCase{"Below", -0.5, -1}, BinCase{"Above", 10.5, 10},
-    BinCase{"TinyAboveMaximum", std::nextafter(10.0, 11.0), 10}),
-    [](const ::testing::TestParamInfo<BinCase>& p) { return p.param.fName; });
+    BinCase{"TinyAboveMaximum", std::nextafter(10.0, 11.0), 10}), ByName<BinCase>);
 // clang-format on
 
 TEST(MCHistogramData, DegenerateRangeTakesEveryValueInOneBin) {
     for (const auto& range : {std::pair<double, double>{3.0, 3.0}, {5.0, 1.0}, {0.0, kInf}}) {
         MCHistogramData h(10, range.first, range.second, true);
-        EXPECT_EQ(h.GetNBins(), 1);
-        EXPECT_EQ(h.GetBinWidth(), 0.0);
+        EXPECT_TRUE(h.GetNBins() == 1 && h.GetBinWidth() == 0.0);
         h.UpdateData(1.0, 1.0, -100.0);
         h.UpdateData(1.0, 1.0, 3.0);
         EXPECT_EQ(h.GetBinWeight(0), 2.0);
@@ -347,12 +326,10 @@ TEST(MCHistogramData, MomentsUseBothWeightsAndMergeChecksTheBins) {
     MCHistogramData h(4, 0.0, 4.0, true);
     h.UpdateData(1.0, 1.0, 1.0);
     h.UpdateData(0.5, 2.0, 3.0);
-    EXPECT_EQ(h.GetTotalWeight(), 1.5);
-    EXPECT_EQ(h.GetTotalWeighted(), 2.0);
-    EXPECT_EQ(h.GetMean(), 2.0);
-    EXPECT_EQ(h.GetVariance(), 2.0);
+    EXPECT_EQ((std::vector<double>{h.GetTotalWeight(), h.GetTotalWeighted(), h.GetMean(),
+                                   h.GetVariance()}),
+              (std::vector<double>{1.5, 2.0, 2.0, 2.0}));
     EXPECT_TRUE(MCMV::IsMissing(MCHistogramData(4, 0.0, 4.0, false).GetVariance()));
-
     const MCHistogramData before = h;
     EXPECT_FALSE(h.Merge(MCHistogramData(5, 0.0, 4.0, true)));
     EXPECT_FALSE(h.Merge(MCHistogramData(4, 0.5, 4.5, true)));

@@ -2,6 +2,7 @@
 // wrapping (argument order, the rate convention, missing values), the edges the guards.
 #include "mcmath/mcdistfun.h"
 #include "mcmath/mcmathfun.h"
+#include "mcmath/mcquantile.h"
 
 #include "mccommon/mcmv.h"
 #include "mctolerance.h"
@@ -14,6 +15,7 @@
 #include <limits>
 #include <map>
 #include <string>
+#include <tuple>
 #include <utility>
 #include <vector>
 
@@ -53,10 +55,17 @@ double Evaluate(const mcreference::DistFunRow& r) {
 
 class DistFunReference : public ::testing::TestWithParam<mcreference::DistFunRow> {};
 
+// The quantile rows also check the prepared quantiles of the normal score.
 TEST_P(DistFunReference, AgreesWithHighPrecisionValue) {
     const auto& row = GetParam();
     EXPECT_NEAR_REL(Evaluate(row), row.fExpected, kRefRel)
         << row.fFunction << "(" << row.fA << ", " << row.fB << ", " << row.fC << ")";
+    const std::string f = row.fFunction;
+    const double prepared = f == "IdfGam"    ? MCMath_800::MCGammaQuantile(row.fB, row.fC)(row.fA)
+                            : f == "IdfBeta" ? MCMath_800::MCBetaQuantile(row.fB, row.fC)(row.fA)
+                            : f == "IdfNorm" ? MCMath_800::MCNormalQuantile(row.fB, row.fC)(row.fA)
+                                             : row.fExpected;
+    EXPECT_NEAR_REL(prepared, row.fExpected, kRefRel) << "prepared quantile";
 }
 
 INSTANTIATE_TEST_SUITE_P(Mpmath, DistFunReference, ::testing::ValuesIn(mcreference::kDistFunRows),
@@ -65,49 +74,41 @@ INSTANTIATE_TEST_SUITE_P(Mpmath, DistFunReference, ::testing::ValuesIn(mcreferen
                                     std::to_string(paramInfo.index);
                          });
 
-// Bad input gives missing; the ends of the supports give their limits. The rate (not scale)
+// Bad input gives missing (NaN below); the ends of the supports give their limits. A tiny shape
+// puts the Gamma median below the smallest double: its rounded value is 0. The rate (not scale)
 // convention of the Gamma functions is pinned by the reference rows with rate != 1.
 using D = MCDistFun;
-#define MC_CASE(expr) std::make_pair(#expr, (expr))
+#define MC_CASE(expr, expected) std::make_tuple(#expr, (expr), double(expected))
 
-TEST(DistFunEdges, BadInputGivesMissing) {
+TEST(DistFunEdges, BadInputAndEndsOfTheSupport) {
     // clang-format off
-    const std::pair<const char*, double> cases[] = {
-        MC_CASE(D::CdfStdNorm(kNaN)), MC_CASE(D::CdfNorm(1, 0, 0)), MC_CASE(D::CdfNorm(1, kInf, 1)),
-        MC_CASE(D::CdfGam(1, 0, 1)), MC_CASE(D::CdfGam(1, 2, -1)), MC_CASE(D::CdfGam(1, kInf, 1)),
-        MC_CASE(D::CdfGam(kNaN, 2, 1)), MC_CASE(D::CdfBeta(0.5, 0, 1)), MC_CASE(D::CdfChi(3, 0)),
-        MC_CASE(D::CdfBin(1, -1, 0.5)), MC_CASE(D::CdfBin(1, 5, 1.5)),
-        MC_CASE(D::CdfBin(1, kInf, 0.5)), MC_CASE(D::CdfBin(3, 10, -0.2)),
-        MC_CASE(D::CdfBin(kNaN, 10, 0.2)), MC_CASE(D::IdfNorm(0, 0, 1)),
-        MC_CASE(D::IdfNorm(1, 0, 1)), MC_CASE(D::IdfNorm(kNaN, 0, 1)), MC_CASE(D::IdfGam(1, 2, 1)),
-        MC_CASE(D::IdfGam(-0.1, 2, 1)), MC_CASE(D::IdfGam(0.5, 2, 1e-320)),
-        MC_CASE(D::IdfBeta(1.0000001, 2, 3)), MC_CASE(D::norvanednlgam(0)),
-        MC_CASE(D::norvanednlgam(-2)), MC_CASE(D::norvanednlgam(-0.5)),
-        MC_CASE(D::norvanednlgam(kInf)), MC_CASE(MCMathFun::Digamma(-3)),
-        MC_CASE(MCMathFun::Trigamma(0))};
+    const std::tuple<const char*, double, double> cases[] = {
+        MC_CASE(D::CdfStdNorm(kNaN), kNaN), MC_CASE(D::CdfNorm(1, 0, 0), kNaN),
+        MC_CASE(D::CdfNorm(1, kInf, 1), kNaN), MC_CASE(D::CdfGam(1, 0, 1), kNaN),
+        MC_CASE(D::CdfGam(1, 2, -1), kNaN), MC_CASE(D::CdfGam(1, kInf, 1), kNaN),
+        MC_CASE(D::CdfGam(kNaN, 2, 1), kNaN), MC_CASE(D::CdfBeta(0.5, 0, 1), kNaN),
+        MC_CASE(D::CdfChi(3, 0), kNaN), MC_CASE(D::CdfBin(1, -1, 0.5), kNaN),
+        MC_CASE(D::CdfBin(1, 5, 1.5), kNaN), MC_CASE(D::CdfBin(1, kInf, 0.5), kNaN),
+        MC_CASE(D::CdfBin(3, 10, -0.2), kNaN), MC_CASE(D::CdfBin(kNaN, 10, 0.2), kNaN),
+        MC_CASE(D::IdfNorm(0, 0, 1), kNaN), MC_CASE(D::IdfNorm(1, 0, 1), kNaN),
+        MC_CASE(D::IdfNorm(kNaN, 0, 1), kNaN), MC_CASE(D::IdfGam(1, 2, 1), kNaN),
+        MC_CASE(D::IdfGam(-0.1, 2, 1), kNaN), MC_CASE(D::IdfGam(0.5, 2, 1e-320), kNaN),
+        MC_CASE(D::IdfBeta(1.0000001, 2, 3), kNaN), MC_CASE(D::norvanednlgam(0), kNaN),
+        MC_CASE(D::norvanednlgam(-2), kNaN), MC_CASE(D::norvanednlgam(-0.5), kNaN),
+        MC_CASE(D::norvanednlgam(kInf), kNaN), MC_CASE(MCMathFun::Digamma(-3), kNaN),
+        MC_CASE(MCMathFun::Trigamma(0), kNaN),
+        MC_CASE(D::CdfStdNorm(-kInf), 0), MC_CASE(D::CdfStdNorm(kInf), 1),
+        MC_CASE(D::CdfGam(0, 0.3, 2), 0), MC_CASE(D::CdfGam(-5, 0.3, 2), 0),
+        MC_CASE(D::CdfGam(kInf, 0.3, 2), 1), MC_CASE(D::CdfGam(1e300, 2, 1e300), 1),
+        MC_CASE(D::CdfBeta(0, 0.5, 0.5), 0), MC_CASE(D::CdfBeta(1, 0.5, 0.5), 1),
+        MC_CASE(D::CdfBeta(7, 2, 2), 1), MC_CASE(D::CdfChi(0, 3), 0),
+        MC_CASE(D::CdfBin(-1, 10, 0.3), 0), MC_CASE(D::CdfBin(10, 10, 0.3), 1),
+        MC_CASE(D::CdfBin(3, 10, 0), 1), MC_CASE(D::CdfBin(3, 10, 1), 0),
+        MC_CASE(D::IdfGam(0, 0.01, 2), 0), MC_CASE(D::IdfBeta(0, 0.3, 4), 0),
+        MC_CASE(D::IdfBeta(1, 0.3, 4), 1), MC_CASE(D::IdfGam(0.5, 1e-4, 1), 0)};
     // clang-format on
-    for (const auto& [name, value] : cases) {
-        EXPECT_TRUE(MCMV::IsMissing(value)) << name << " gave " << value;
-    }
-}
-
-// Each row: (call, expected). A tiny shape puts the Gamma median below the smallest double: its
-// rounded value is 0.
-TEST(DistFunEdges, EndsOfTheSupport) {
-    // clang-format off
-    const std::pair<std::pair<const char*, double>, double> cases[] = {
-        {MC_CASE(D::CdfStdNorm(-kInf)), 0}, {MC_CASE(D::CdfStdNorm(kInf)), 1},
-        {MC_CASE(D::CdfGam(0, 0.3, 2)), 0}, {MC_CASE(D::CdfGam(-5, 0.3, 2)), 0},
-        {MC_CASE(D::CdfGam(kInf, 0.3, 2)), 1}, {MC_CASE(D::CdfGam(1e300, 2, 1e300)), 1},
-        {MC_CASE(D::CdfBeta(0, 0.5, 0.5)), 0}, {MC_CASE(D::CdfBeta(1, 0.5, 0.5)), 1},
-        {MC_CASE(D::CdfBeta(7, 2, 2)), 1}, {MC_CASE(D::CdfChi(0, 3)), 0},
-        {MC_CASE(D::CdfBin(-1, 10, 0.3)), 0}, {MC_CASE(D::CdfBin(10, 10, 0.3)), 1},
-        {MC_CASE(D::CdfBin(3, 10, 0)), 1}, {MC_CASE(D::CdfBin(3, 10, 1)), 0},
-        {MC_CASE(D::IdfGam(0, 0.01, 2)), 0}, {MC_CASE(D::IdfBeta(0, 0.3, 4)), 0},
-        {MC_CASE(D::IdfBeta(1, 0.3, 4)), 1}, {MC_CASE(D::IdfGam(0.5, 1e-4, 1)), 0}};
-    // clang-format on
-    for (const auto& [call, expected] : cases) {
-        EXPECT_EQ(call.second, expected) << call.first;
+    for (const auto& [call, value, expected] : cases) {
+        EXPECT_TRUE(mctest::Near(value, expected, 0.0)) << call;
     }
 }
 
@@ -143,29 +144,27 @@ const std::vector<double> kZeroEnds = {0.0, 0.0, 0.4, 1.0, 1.0};
 const std::vector<double> kShortTotal = {0.0, 0.3, 0.6, 0.9999999};
 
 // clang-format off
-INSTANTIATE_TEST_SUITE_P(Cells, BinSearchTable, ::testing::Values(
-    BinSearchCase{"ZeroIsFirstCell", kTable, 0, 4, 0.0, false, 0},
-    BinSearchCase{"Inside", kTable, 0, 4, 0.1, false, 0},
-    BinSearchCase{"BoundaryGoesUp", kTable, 0, 4, 0.2, false, 2},
-    BinSearchCase{"BoundaryGoesUp2", kTable, 0, 4, 0.5, false, 3},
-    BinSearchCase{"JustBelowBoundary", kTable, 0, 4, std::nextafter(0.5, 0.0), false, 2},
-    BinSearchCase{"LastCell", kTable, 0, 4, 0.9999999999999999, false, 3},
-    BinSearchCase{"TotalClampsToLastCell", kTable, 0, 4, 1.0, false, 3},
-    BinSearchCase{"BelowClampsToFirstCell", kTable, 0, 4, -0.3, false, 0},
-    BinSearchCase{"RightClosedBoundaryGoesDown", kTable, 0, 4, 0.2, true, 0},
-    BinSearchCase{"RightClosedBoundaryGoesDown2", kTable, 0, 4, 0.5, true, 2},
-    BinSearchCase{"RightClosedZero", kTable, 0, 4, 0.0, true, 0},
-    BinSearchCase{"RightClosedTotal", kTable, 0, 4, 1.0, true, 3},
-    BinSearchCase{"LeadingEmptyCellSkipped", kZeroEnds, 0, 4, 0.0, false, 1},
-    BinSearchCase{"TrailingEmptyCellSkipped", kZeroEnds, 0, 4, 1.0, false, 2},
-    BinSearchCase{"TrailingEmptyCellSkippedRC", kZeroEnds, 0, 4, 1.0, true, 2},
-    BinSearchCase{"ShortTotal", kShortTotal, 0, 3, 0.99999995, false, 2},
-    BinSearchCase{"SubRange", kTable, 2, 4, 0.1, false, 2},
-    BinSearchCase{"SubRangeInside", kTable, 2, 4, 0.7, false, 3},
-    BinSearchCase{"NaNHasNoCell", kTable, 0, 4, kNaN, false, -1},
-    BinSearchCase{"HiPastEndHasNoCell", kTable, 0, 5, 0.3, false, -1},
-    BinSearchCase{"EmptyRangeHasNoCell", kTable, 3, 3, 0.3, false, 2},
-    BinSearchCase{"AllZeroWidthGivesFirst", {0.0, 0.0, 0.0}, 0, 2, 0.5, false, 0}),
+INSTANTIATE_TEST_SUITE_P(Cells, BinSearchTable, ::testing::ValuesIn(std::vector<BinSearchCase>{
+    {"ZeroIsFirstCell", kTable, 0, 4, 0.0, false, 0}, {"Inside", kTable, 0, 4, 0.1, false, 0},
+    {"BoundaryGoesUp", kTable, 0, 4, 0.2, false, 2},
+    {"BoundaryGoesUp2", kTable, 0, 4, 0.5, false, 3},
+    {"JustBelowBoundary", kTable, 0, 4, std::nextafter(0.5, 0.0), false, 2},
+    {"LastCell", kTable, 0, 4, 0.9999999999999999, false, 3},
+    {"TotalClampsToLastCell", kTable, 0, 4, 1.0, false, 3},
+    {"BelowClampsToFirstCell", kTable, 0, 4, -0.3, false, 0},
+    {"RightClosedBoundaryGoesDown", kTable, 0, 4, 0.2, true, 0},
+    {"RightClosedBoundaryGoesDown2", kTable, 0, 4, 0.5, true, 2},
+    {"RightClosedZero", kTable, 0, 4, 0.0, true, 0},
+    {"RightClosedTotal", kTable, 0, 4, 1.0, true, 3},
+    {"LeadingEmptyCellSkipped", kZeroEnds, 0, 4, 0.0, false, 1},
+    {"TrailingEmptyCellSkipped", kZeroEnds, 0, 4, 1.0, false, 2},
+    {"TrailingEmptyCellSkippedRC", kZeroEnds, 0, 4, 1.0, true, 2},
+    {"ShortTotal", kShortTotal, 0, 3, 0.99999995, false, 2},
+    {"SubRange", kTable, 2, 4, 0.1, false, 2}, {"SubRangeInside", kTable, 2, 4, 0.7, false, 3},
+    {"NaNHasNoCell", kTable, 0, 4, kNaN, false, -1},
+    {"HiPastEndHasNoCell", kTable, 0, 5, 0.3, false, -1},
+    {"EmptyRangeHasNoCell", kTable, 3, 3, 0.3, false, 2},
+    {"AllZeroWidthGivesFirst", {0.0, 0.0, 0.0}, 0, 2, 0.5, false, 0}}),
     [](const ::testing::TestParamInfo<BinSearchCase>& p) { return p.param.fName; });
 // clang-format on
 

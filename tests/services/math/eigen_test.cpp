@@ -10,6 +10,7 @@
 
 #include <cmath>
 #include <limits>
+#include <tuple>
 #include <vector>
 
 using MCMath_800::MCEigenValues;
@@ -30,18 +31,10 @@ MCSymMatrix Matrix(int n, const std::vector<double>& lower) {
 }
 
 Eigen::MatrixXd Dense(const MCSymMatrix& m) {
-    const int n = m.GetNRows();
-    Eigen::MatrixXd d(n, n);
-    for (int i = 0; i < n; ++i) {
-        for (int j = 0; j < n; ++j) {
-            d(i, j) = m.GetElem(i, j);
-        }
-    }
-    return d;
-}
-
-double MinEigenValue(const MCSymMatrix& m) {
-    return Eigen::SelfAdjointEigenSolver<Eigen::MatrixXd>(Dense(m)).eigenvalues().minCoeff();
+    return Eigen::MatrixXd::NullaryExpr(
+        m.GetNRows(), m.GetNRows(), [&m](Eigen::Index i, Eigen::Index j) {
+            return m.GetElem(static_cast<int>(i), static_cast<int>(j));
+        });
 }
 
 //! The simple repair the projections must beat: clip the eigenvalues at eps, rescale to a
@@ -81,9 +74,10 @@ TEST(MCEigenValues, HighamsExampleReachesThePublishedNearestCorrelationMatrix) {
     bool adjusted = false;
     ASSERT_TRUE(eigen.GetPDHMatrix(1e-6, out, adjusted));
     EXPECT_TRUE(adjusted);
-    EXPECT_NEAR(out.GetElem(1, 0), 0.7607, 5e-5);
-    EXPECT_NEAR(out.GetElem(2, 0), 0.1573, 5e-5);
-    EXPECT_NEAR(out.GetElem(2, 1), 0.7607, 5e-5);
+    for (const auto& [i, j, expected] :
+         {std::tuple{1, 0, 0.7607}, {2, 0, 0.1573}, {2, 1, 0.7607}}) {
+        EXPECT_NEAR(out.GetElem(i, j), expected, 5e-5);
+    }
     EXPECT_LT(eigen.GetIterations(), 200);
 }
 
@@ -103,22 +97,20 @@ TEST_P(RepairOfIndefinite, GivesANearbyPositiveDefiniteCorrelationMatrix) {
     bool adjusted = false;
     ASSERT_TRUE(eigen.GetPDHMatrix(eps, out, adjusted));
     EXPECT_TRUE(adjusted);
-    const int n = q.GetNRows();
-    ASSERT_EQ(out.GetNRows(), n);
-    for (int i = 0; i < n; ++i) {
+    ASSERT_EQ(out.GetNRows(), q.GetNRows());
+    for (int i = 0; i < q.GetNRows(); ++i) {
         EXPECT_EQ(out.GetElem(i, i), 1.0);
         for (int j = 0; j < i; ++j) {
             EXPECT_LE(std::fabs(out.GetElem(i, j)), 1.0);
         }
     }
-    EXPECT_GT(MinEigenValue(out), 0.5 * eps);
+    const Eigen::SelfAdjointEigenSolver<Eigen::MatrixXd> spectrum(Dense(out));
+    EXPECT_GT(spectrum.eigenvalues().minCoeff(), 0.5 * eps);
     EXPECT_EQ(Eigen::LLT<Eigen::MatrixXd>(Dense(out)).info(), Eigen::Success);
-    // Near the input: no farther than the plain clip-and-rescale repair, up to the order of
-    // eps (rescaling pushes the clipped matrix's eigenvalues a little below eps, so it lies
-    // in a slightly larger set than the projections' result).
-    const double distance = (Dense(out) - Dense(q)).norm();
-    const double clipDistance = (ClipAndRescale(q, eps) - Dense(q)).norm();
-    EXPECT_LE(distance, clipDistance + 10.0 * eps) << distance - clipDistance;
+    // No farther from the input than clip-and-rescale, up to O(eps): rescaling pushes the
+    // clipped eigenvalues a little below eps, a slightly larger set than the projections'.
+    EXPECT_LE((Dense(out) - Dense(q)).norm(),
+              (ClipAndRescale(q, eps) - Dense(q)).norm() + 10 * eps);
     // A positive definite matrix, such as the repaired one, is returned untouched.
     MCEigenValues again(out, 1e-12, 30);
     MCSymMatrix twice;
@@ -150,14 +142,11 @@ TEST(MCEigenValues, NoRepairForUnusableInput) {
     MCEigenValues withNaN(Matrix(2, {1, nan, 1}), 1e-12, 30);
     EXPECT_FALSE(withNaN.IsValid());
     EXPECT_FALSE(withNaN.GetPDHMatrix(1e-6, out, adjusted));
-    MCEigenValues empty(MCSymMatrix(), 1e-12, 30);
-    EXPECT_FALSE(empty.GetPDHMatrix(1e-6, out, adjusted));
-    // An eps outside (0, 1) is refused.
+    EXPECT_FALSE(MCEigenValues(MCSymMatrix(), 1e-12, 30).GetPDHMatrix(1e-6, out, adjusted));
     MCEigenValues fine(Matrix(2, {1, 0.5, 1}), 1e-12, 30);
-    EXPECT_FALSE(fine.GetPDHMatrix(0.0, out, adjusted));
-    EXPECT_FALSE(fine.GetPDHMatrix(1.0, out, adjusted));
-    EXPECT_FALSE(fine.GetPDHMatrix(nan, out, adjusted));
-
+    for (const double eps : {0.0, 1.0, nan}) { // outside (0, 1)
+        EXPECT_FALSE(fine.GetPDHMatrix(eps, out, adjusted)) << eps;
+    }
     // Failures leave the caller's values alone.
     EXPECT_TRUE(out.GetNRows() == 1 && out.GetElem(0, 0) == 7.0 && adjusted);
 }

@@ -17,8 +17,8 @@ namespace {
 
 using Codes = std::vector<int>;
 
-// Three factors stored at record variables 4, 1 and 2 (not in order, to catch a table that
-// reads the record by factor position), with 2, 3 and 4 levels.
+// Three factors of 2, 3 and 4 levels at record variables 4, 1 and 2 (out of order, to catch a
+// table that reads the record by factor position).
 const Codes kFactorVars{4, 1, 2};
 
 // A record whose factor values are the codes plus an offset in (-0.5, 0.5) that rounds away.
@@ -41,9 +41,8 @@ std::vector<Codes> AllCodeVectors() {
 
 class FactorTable : public ::testing::TestWithParam<double> {};
 
-// The cells are exactly the combinations seen (in any order, any number of times), numbered in
-// lexicographic order from the first index. With every combination present, the cell of
-// (a, b, c) is thus the row-major position a·(3·4) + b·4 + c: the first factor varies slowest.
+// The cells are the combinations seen (in any order, any number of times), numbered
+// lexicographically from the first index: with all present, (a, b, c) is at a·12 + b·4 + c.
 // The mapping and its inverse agree for every code vector of the full grid.
 TEST_P(FactorTable, HoldsTheObservedCellsInLexicographicOrder) {
     MCFactorTables t;

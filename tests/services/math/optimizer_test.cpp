@@ -24,9 +24,8 @@ using namespace MCMath_800;
 
 namespace {
 
-// Beta log-likelihood from its sufficient statistics n, S1 = Σ ln x, S2 = Σ ln(1-x):
-//   LL(a, b) = n·(lnΓ(a+b) - lnΓ(a) - lnΓ(b)) + (a-1)·S1 + (b-1)·S2.
-// The accumulator holds -LL, its gradient and Hessian, and the constraint rows.
+// -LL of the Beta from its sufficient statistics n, S1 = Σ ln x, S2 = Σ ln(1-x), with gradient,
+// Hessian and constraint rows: LL(a, b) = n·(lnΓ(a+b) - lnΓ(a) - lnΓ(b)) + (a-1)·S1 + (b-1)·S2.
 struct BetaAccum : IMCOptAccumStats {
     BetaAccum(std::vector<double>* params, double n, double s1, double s2)
         : fpParams(params), fN(n), fS1(s1), fS2(s2) {
@@ -87,8 +86,8 @@ struct BetaAccum : IMCOptAccumStats {
                                                                {{0.0, 1.0}, -1e-5}};
 };
 
-// A data handler without records: each evaluation only finishes the accumulator. It records
-// the flags of every call and can fail (or throw) at a chosen call.
+// A data handler without records: each evaluation only finishes the accumulator, recording the
+// flags of every call; it can fail (or throw) at a chosen call.
 struct StatsHandler : IMCOptDataHandler {
     void SetAccumStats(IMCOptAccumStats* accum) override { fpAccum = accum; }
     void ResetAccumStats(int mode, bool check) override {
@@ -124,9 +123,7 @@ struct StatsHandler : IMCOptDataHandler {
     int fEnded = 0;           //!< EndOptimization calls
 };
 
-// Data sets x_i = g((i + 0.5)/n), i = 0 .. n-1, and their reference estimates, computed with
-// mpmath at 40 digits by solving the likelihood equations (the script is short enough to keep
-// here):
+// Data sets x_i = g((i + 0.5)/n), i = 0 .. n-1, and their estimates by mpmath at 40 digits:
 //
 //   from mpmath import mp, mpf, log, digamma, findroot
 //   mp.dps = 40
@@ -141,8 +138,7 @@ struct StatsHandler : IMCOptDataHandler {
 //       return a, b, ac, bb, sc, t, sc-t
 //   e.g. fit([((mpf(i)+mpf('0.5'))/40)**2 for i in range(40)])
 //
-// On the line a + b = s the term lnΓ(a+b) is constant, so the constrained maximum solves
-// ψ(s-t) - ψ(t) = (S2 - S1)/n with a = t.
+// On the line a + b = s, lnΓ(a+b) is constant: the maximum solves ψ(s-t) - ψ(t) = (S2 - S1)/n.
 struct BetaCase {
     const char* fName;
     double (*fData)(double u); //!< x = g(u)
@@ -169,26 +165,23 @@ const BetaCase kBetaCases[] = {
 };
 // clang-format on
 
-// One Beta problem: the parameter vector (starting at the moment estimates, divisor n-1, as
-// the fitting does), its accumulator and a handler.
+// One Beta problem: parameters starting at the moment estimates (divisor n-1, as the fitting
+// does), its accumulator and a handler.
 struct BetaProblem {
     explicit BetaProblem(const BetaCase& c) {
         std::vector<double> x;
-        double s1 = 0.0;
-        double s2 = 0.0;
+        double s1 = 0.0, s2 = 0.0, var = 0.0;
         for (int i = 0; i < c.fN; ++i) {
             x.push_back(c.fData((i + 0.5) / c.fN));
             s1 += std::log(x.back());
             s2 += std::log1p(-x.back());
         }
         const double mean = std::accumulate(x.begin(), x.end(), 0.0) / c.fN;
-        double var = 0.0;
         for (double v : x) {
             var += (v - mean) * (v - mean) / (c.fN - 1);
         }
         const double t = (1.0 - mean) * mean / var - 1.0;
-        fvStart = {mean * t, (1.0 - mean) * t};
-        fvParams = fvStart;
+        fvParams = fvStart = {mean * t, (1.0 - mean) * t};
         fpAccum = std::make_unique<BetaAccum>(&fvParams, c.fN, s1, s2);
     }
     MCStatus Run(const MCOptimParams& settings = MCOptimParams()) {
@@ -203,8 +196,8 @@ struct BetaProblem {
     std::unique_ptr<IMCOptimizer> fpOptimizer;
 };
 
-// The default settings (Hessian at the end, parameter rule, constraints with start repair)
-// are those of the fitting; these change one or two of them.
+// The fitting's default settings (Hessian at the end, parameter rule, start repair) with one or
+// two changed.
 MCOptimParams With(int MCOptimParams::*field, int value, int MCOptimParams::*field2 = nullptr,
                    int value2 = 0) {
     MCOptimParams p;
@@ -215,8 +208,8 @@ MCOptimParams With(int MCOptimParams::*field, int value, int MCOptimParams::*fie
     return p;
 }
 
-// The search stops when a step changes every parameter by less than 1e-10 relative; SLSQP's
-// last steps are superlinear but not yet quadratic, and leave errors up to about 1e-8 here.
+// The search stops at a relative step below 1e-10; SLSQP's last steps are superlinear, not yet
+// quadratic, and leave errors up to about 1e-8 here.
 constexpr double kEstimateTol = 1e-7;
 
 void ExpectEstimate(const std::vector<double>& params, double a, double b, double rel) {
@@ -226,7 +219,7 @@ void ExpectEstimate(const std::vector<double>& params, double a, double b, doubl
 
 class BetaFit : public ::testing::TestWithParam<BetaCase> {};
 
-TEST_P(BetaFit, ReachesTheMaximumLikelihoodEstimate) {
+TEST_P(BetaFit, ReachesTheEstimateFreeAndUnderActiveConstraints) {
     const BetaCase& c = GetParam();
     BetaProblem p(c);
     const MCStatus status = p.Run();
@@ -245,10 +238,8 @@ TEST_P(BetaFit, ReachesTheMaximumLikelihoodEstimate) {
     }
     EXPECT_EQ(p.fHandler.fEnded, 1);
     EXPECT_LT(p.fpOptimizer->GetNEvaluations(), 200);
-}
 
-TEST_P(BetaFit, StopsOnAnActiveBoundOrRow) {
-    const BetaCase& c = GetParam();
+    // An active bound and an active general row stop the search on them.
     BetaProblem bound(c);
     bound.fpAccum->fvRows.push_back({{-1.0, 0.0}, c.fBoundA}); // a ≤ fBoundA: passed as a bound
     ASSERT_TRUE(bound.Run().IsOK());
@@ -262,17 +253,13 @@ TEST_P(BetaFit, StopsOnAnActiveBoundOrRow) {
     // Feasible up to the row tolerance 1e-11, and on the row.
     EXPECT_LE(row.fvParams[0] + row.fvParams[1], c.fSum + 1e-11 * std::max(1.0, c.fSum));
     ExpectEstimate(row.fvParams, c.fLineA, c.fLineB, kEstimateTol);
-}
 
-TEST_P(BetaFit, OtherRulesAndMethodsReachTheEstimateToo) {
-    const BetaCase& c = GetParam();
-    // A relative objective change of 1e-12 leaves a parameter error of about
-    // sqrt(1e-12·|LL|/(n·ψ')), below 1e-6 here.
+    // The objective rule (1e-12 relative leaves about sqrt(1e-12·|LL|/(n·ψ')) < 1e-6 on the
+    // parameters) and COBYLA (whose linear models end less sharply) reach the estimate too.
     BetaProblem byObjective(c);
     ASSERT_TRUE(byObjective.Run(With(&MCOptimParams::fConvergenceRule, 2)).IsOK());
     ExpectEstimate(byObjective.fvParams, c.fA, c.fB, 1e-5);
 
-    // COBYLA's linear models end less sharply than SLSQP.
     BetaProblem derivativeFree(c);
     ASSERT_TRUE(
         derivativeFree
@@ -287,20 +274,27 @@ TEST_P(BetaFit, OtherRulesAndMethodsReachTheEstimateToo) {
 INSTANTIATE_TEST_SUITE_P(Reference, BetaFit, ::testing::ValuesIn(kBetaCases),
                          [](const ::testing::TestParamInfo<BetaCase>& p) { return p.param.fName; });
 
-// ------------------------------------------------------------------------------------------
-
-TEST(MCOptimizer, StartOutsideTheBoundsIsMovedInside) {
+TEST(MCOptimizer, StartOutsideTheBoundsIsMovedInsideAndEvaluationLimitWarns) {
     BetaProblem p(kBetaCases[0]);
     p.fvParams = {-2.0, 0.5};
     ASSERT_TRUE(p.Run().IsOK());
     ExpectEstimate(p.fvParams, kBetaCases[0].fA, kBetaCases[0].fB, kEstimateTol);
+
+    // The evaluation limit gives a warning and a feasible point.
+    BetaProblem limited(kBetaCases[2]);
+    limited.fvParams = {0.5, 30.0};
+    const MCStatus status = limited.Run(With(&MCOptimParams::fMaxEvaluations, 3));
+    EXPECT_TRUE(status.IsWarning());
+    EXPECT_EQ(status.GetErrorCode(), kOptStatusNoConvergence);
+    EXPECT_TRUE(limited.fvParams[0] >= 1e-5 && limited.fvParams[1] >= 1e-5);
+    EXPECT_TRUE(std::isfinite(limited.fpOptimizer->GetObjective()));
 }
 
-// A failure reported by the handler (or thrown by it) ends the run with that status and
-// restores the start values.
+// A failure reported (or thrown) by the handler at its third call ends the run with that status
+// and restores the start values.
 struct FailCase {
     const char* fName;
-    long fCode;   //!< status the handler returns at its third call
+    long fCode;
     bool fbThrow; //!< throw instead
     long fExpected;
 };
@@ -371,16 +365,6 @@ INSTANTIATE_TEST_SUITE_P(Table, OptimizerSetup, ::testing::Values(
     SetupCase{"NoEvaluations", {1.0, 1.0}, {}, 0.0, With(&MCOptimParams::fMaxEvaluations, 0)}),
     [](const ::testing::TestParamInfo<SetupCase>& p) { return p.param.fName; });
 // clang-format on
-
-TEST(MCOptimizer, EvaluationLimitGivesAWarningAndAFeasiblePoint) {
-    BetaProblem p(kBetaCases[2]);
-    p.fvParams = {0.5, 30.0};
-    const MCStatus status = p.Run(With(&MCOptimParams::fMaxEvaluations, 3));
-    EXPECT_TRUE(status.IsWarning());
-    EXPECT_EQ(status.GetErrorCode(), kOptStatusNoConvergence);
-    EXPECT_TRUE(p.fvParams[0] >= 1e-5 && p.fvParams[1] >= 1e-5);
-    EXPECT_TRUE(std::isfinite(p.fpOptimizer->GetObjective()));
-}
 
 TEST(MCOptimizer, MissingAccumulatorIsReportedAsNoStatistics) {
     std::vector<double> params{1.0, 1.0};

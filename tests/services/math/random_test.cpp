@@ -56,38 +56,40 @@ MCRandomValues StandardNormal(MCURandom& stream) {
     return normal;
 }
 
-TEST(MCURandom, IsTheStandardSixtyFourBitMersenneTwister) {
-    // The 10000th output of MT19937-64 from the default seed 5489 is fixed by the C++
-    // standard ([rand.predef]): the stream is the same engine on every platform.
-    MCURandom stream(5489u);
+// Regression: a change here changes every simulation run with the default seed.
+TEST(MCURandom, IsTheStandardMersenneTwisterWithPinnedDefaultOutputs) {
+    // The 10000th output of MT19937-64 from seed 5489 is fixed by the C++ standard
+    // ([rand.predef]): the stream is the same engine on every platform.
+    MCURandom standard(5489u);
     std::uint64_t w = 0;
     for (int i = 0; i < 10000; ++i) {
-        w = stream.GetWord();
+        w = standard.GetWord();
     }
     EXPECT_EQ(w, 9981545732273789042ULL);
-}
-
-TEST(MCURandom, FirstValuesOfTheDefaultSeedArePinned) {
-    // Regression: a change here changes every simulation run with the default seed. The values
-    // were computed independently, from the words of std::mt19937_64(629111597).
-    MCURandom stream;
-    const double expected[] = {0.40956470070444084, 0.14201911697009295, 0.60955487052763202,
-                               0.18792881150235941, 0.90282555026573597};
-    for (const double e : expected) {
-        EXPECT_EQ(stream.GetRandom(), e);
+    // Uniforms computed independently from the words of std::mt19937_64(629111597); normals
+    // by a separate program calling boost::random::normal_distribution<double> on that
+    // engine, Boost 1.74 (a new method or Boost ziggurat would change them).
+    MCURandom uniforms, normals;
+    MCRandomValues normal = StandardNormal(normals);
+    const double expected[][2] = {{0.40956470070444084, -0.57274834836357313},
+                                  {0.14201911697009295, 0.28232826328919891},
+                                  {0.60955487052763202, 0.59888815007241947},
+                                  {0.18792881150235941, -0.28301497125580438},
+                                  {0.90282555026573597, -1.5225221611546746}};
+    for (const auto& e : expected) {
+        EXPECT_EQ(uniforms.GetRandom(), e[0]);
+        EXPECT_EQ(normal.GetRandom(), e[1]);
     }
 }
 
 // [0, 1) takes the top 53 bits of a word, (0, 1) the top 52 bits and a final 1: the words 0 and
 // 2^64 - 1 give the ends 0 and 1 - 2^-53, and 2^-53 and 1 - 2^-53.
 TEST(MCURandom, DoublesAreBuiltFromTheTopBitsOfEachWord) {
-    std::vector<std::uint64_t> words{0, ~std::uint64_t{0}};
+    std::vector<std::uint64_t> words(1002);
     MCURandom engine(12345u);
-    for (int i = 0; i < 1000; ++i) {
-        words.push_back(engine.GetWord());
-    }
-    ListSource a(words);
-    ListSource b(words);
+    std::generate(words.begin() + 2, words.end(), [&engine] { return engine.GetWord(); });
+    words[1] = ~std::uint64_t{0};
+    ListSource a(words), b(words);
     MCURandom halfOpen(1u, true, true, &a);
     MCURandom open(1u, true, false, &b);
     for (const std::uint64_t w : words) {
@@ -105,10 +107,8 @@ TEST(MCURandom, CopyReseedAndDrawnSeedReproduceTheStream) {
     for (int i = 0; i < 1000; ++i) {
         ASSERT_EQ(a.GetRandom(), worker.GetRandom());
     }
-    MCURandom fresh(777u);
+    MCURandom fresh(777u), drawn(0u, false), again(drawn.GetSeed());
     a.SetSeed(777u);
-    MCURandom drawn(0u, false);
-    MCURandom again(drawn.GetSeed());
     for (int i = 0; i < 100; ++i) {
         ASSERT_EQ(a.GetRandom(), fresh.GetRandom());
         ASSERT_EQ(drawn.GetRandom(), again.GetRandom());
@@ -127,11 +127,9 @@ TEST(MCRandomValues, NormalsAreBoostsZigguratOnTheStreamsWords) {
             ASSERT_EQ(normal.GetRandom(), reference(engine)) << "seed " << seed << " draw " << i;
         }
     }
-    std::vector<std::uint64_t> words;
     boost::random::mt19937_64 engine(5u);
-    for (int i = 0; i < 3000; ++i) {
-        words.push_back(engine());
-    }
+    std::vector<std::uint64_t> words(3000);
+    std::generate(words.begin(), words.end(), engine);
     ListSource source(words);
     MCURandom hosted(0u, true, true, &source);
     MCRandomValues normal = StandardNormal(hosted);
@@ -142,25 +140,10 @@ TEST(MCRandomValues, NormalsAreBoostsZigguratOnTheStreamsWords) {
     }
 }
 
-TEST(MCRandomValues, FirstNormalsOfTheDefaultSeedArePinned) {
-    // Regression: a change here (a new method, or a Boost release that changes its ziggurat)
-    // changes every simulation run with the default seed. The values are those of a separate
-    // program calling boost::random::normal_distribution<double> on mt19937_64(629111597),
-    // Boost 1.74.
-    MCURandom stream;
-    MCRandomValues normal = StandardNormal(stream);
-    const double expected[] = {-0.57274834836357313, 0.28232826328919891, 0.59888815007241947,
-                               -0.28301497125580438, -1.5225221611546746};
-    for (const double e : expected) {
-        EXPECT_EQ(normal.GetRandom(), e);
-    }
-}
-
 TEST(MCRandomValues, NormalsFollowTheStandardNormalIntoTheTails) {
-    // 10^6 draws. Kolmogorov-Smirnov against Φ with the DKW bound of false-failure rate 1e-6,
-    // sqrt(ln(2e6)/(2n)) = 0.0027; and the share beyond |z| = 3.4426 (the ziggurat's tail
-    // layer, drawn by its own method), expected 2(1 − Φ(3.4426)) = 5.76e-4, i.e. 576 values
-    // with a standard deviation of 24: the bounds are 6 standard deviations.
+    // 10^6 draws: Kolmogorov-Smirnov against Φ under the DKW bound of false-failure rate 1e-6,
+    // sqrt(ln(2e6)/(2n)); the share beyond the ziggurat's tail layer |z| = 3.4426, drawn by its
+    // own method, is 2(1 − Φ(3.4426))·n ≈ 576 ± 24: 6 standard deviations.
     MCURandom stream(20261207u);
     MCRandomValues normal = StandardNormal(stream);
     const int n = 1000000;
@@ -185,18 +168,12 @@ TEST(MCRandomValues, VectorIsConsecutiveNormalsThroughTheCholeskyFactor) {
     // x = m + s·L·z with L = [[1, 0], [r, √(1 − r²)]], z the next normals of the stream; the
     // independent setting gives z itself.
     const double r = 0.6;
-    MCURandom a(99u);
-    MCURandom b = a;
-    MCURandom c = a;
-    MCRandomValues single = StandardNormal(a);
-    MCRandomValues pair;
-    pair.SetURNGPtr(&b);
+    MCURandom a(99u), b = a, c = a;
+    MCRandomValues single = StandardNormal(a), pair = StandardNormal(b),
+                   independent = StandardNormal(c);
     ASSERT_TRUE(pair.SetParamNormal({1.0, -2.0}, 3.0, Matrix(2, {1.0, r, 1.0})));
-    MCRandomValues independent;
-    independent.SetURNGPtr(&c);
     ASSERT_TRUE(independent.SetParamNormal(2));
-    std::vector<double> x;
-    std::vector<double> z;
+    std::vector<double> x, z;
     for (int i = 0; i < 100; ++i) {
         const double z0 = single.GetRandom();
         const double z1 = single.GetRandom();
@@ -210,15 +187,13 @@ TEST(MCRandomValues, VectorIsConsecutiveNormalsThroughTheCholeskyFactor) {
 }
 
 TEST(MCRandomValues, SampleCorrelationMatchesTheRequestedMatrix) {
-    // 200000 vectors: the standard error of a sample correlation ρ is (1 − ρ²)/√n ≤ 0.0023;
-    // the tolerance 0.01 is over four of them (fails for about 1 seed in 10^5), of a mean
-    // 5 standard errors, of a standard deviation 1%.
+    // 200000 vectors: a sample correlation's standard error (1 − ρ²)/√n ≤ 0.0023, so 0.01 is
+    // over four (fails for about 1 seed in 10^5); means within 5 standard errors, sd within 1%.
     const MCSymMatrix corr = Matrix(3, {1.0, 0.6, 1.0, -0.3, 0.2, 1.0});
     const Eigen::Vector3d means(1.0, -2.0, 5.0);
     const double scale = 2.0;
     MCURandom stream(629111597u);
-    MCRandomValues gen;
-    gen.SetURNGPtr(&stream);
+    MCRandomValues gen = StandardNormal(stream);
     ASSERT_TRUE(gen.SetParamNormal({means[0], means[1], means[2]}, scale, corr));
     const int n = 200000;
     Eigen::MatrixXd sample(n, 3);
@@ -271,8 +246,7 @@ class MCRandomValuesBad : public ::testing::TestWithParam<BadSetting> {};
 TEST_P(MCRandomValuesBad, IsRefusedAndLeavesNoSetting) {
     const auto& c = GetParam();
     MCURandom stream(1u);
-    MCRandomValues gen;
-    gen.SetURNGPtr(&stream);
+    MCRandomValues gen = StandardNormal(stream);
     ASSERT_TRUE(gen.SetParamNormal(2));
     EXPECT_FALSE(gen.SetParamNormal(c.fMeans, c.fScale, c.fMatrix));
     std::vector<double> x = {42.0};
