@@ -76,6 +76,28 @@ SECSimulator::SECSimulator(const SECSettings* settings, const SPCSettings* plan,
     ResetCaseValues();
 }
 
+SECSimulator::SECSimulator(const SECSimulator& master, double seedValue, WorkerTag)
+    : fpSettings(master.fpSettings), fpPlan(master.fpPlan), fpVarList(master.fpVarList),
+      fIteration(master.fIteration),
+      fpOwnedStream(std::make_unique<MCMath_800::MCURandom>(
+          SeedFromValue(seedValue, master.fpSettings->GetSeed()), true, true, nullptr)),
+      fpStream(fpOwnedStream.get()), fpCancel(master.fpCancel),
+      fvSimInputs(master.fvSimInputs), fvCorrelated(master.fvCorrelated),
+      fvCategorical(master.fvCategorical), fvFixedInputs(master.fvFixedInputs),
+      fCrosstab(master.fCrosstab), fbHasCrosstab(master.fbHasCrosstab),
+      fNSensIterations(master.fNSensIterations), fSensIterName(master.fSensIterName),
+      fbOpenRange(master.fbOpenRange), fTargetCorr(master.fTargetCorr),
+      fbHasTargetCorr(master.fbHasTargetCorr), fNormalCorr(master.fNormalCorr),
+      fbCorrModelPrepared(master.fbCorrModelPrepared),
+      fbCorrelationFailed(master.fbCorrelationFailed), fCorrModelStatus(master.fCorrModelStatus),
+      fCiZ(master.fCiZ), fpTemplate(&master) {
+    fRandomValues.SetURNGPtr(fpStream);
+    fOwnCancel.SetCancelPtr(fpSettings->GetCancelPointer());
+    fpOutputStats = std::make_unique<SECOutputStats>(*fpSettings, *fpPlan, *fpVarList);
+    SetResultNames();
+    ResetCaseValues();
+}
+
 SECSimulator::~SECSimulator() = default;
 
 std::uint32_t SECSimulator::SeedFromValue(double seedValue, std::uint32_t settingsSeed) {
@@ -94,7 +116,10 @@ void SECSimulator::BuildGenerationModel() {
     BuildFixedInputs();
     BuildCrosstab();
     BuildTargetCorrelations();
+    SetResultNames();
+}
 
+void SECSimulator::SetResultNames() {
     std::vector<std::string> predictors;
     std::vector<std::string> factors;
     std::vector<std::string> covariates;
@@ -365,17 +390,7 @@ void SECSimulator::BuildTargetCorrelations() {
 // ---- Workers and thread tasks -----------------------------------------------------------------
 
 std::unique_ptr<SECSimulator> SECSimulator::CreateWorker(double seedValue) const {
-    auto worker = std::make_unique<SECSimulator>(
-        fpSettings, fpPlan, fpVarList, fIteration, nullptr, seedValue,
-        fNormalCorr.GetNRows() > 0 ? &fNormalCorr : nullptr);
-    worker->fvSimInputs = fvSimInputs;
-    worker->fpCancel = fpCancel;
-    worker->fbCorrModelPrepared = fbCorrModelPrepared;
-    worker->fbCorrelationFailed = fbCorrelationFailed;
-    worker->fCorrModelStatus = fCorrModelStatus;
-    worker->fCiZ = fCiZ;
-    worker->fpTemplate = this;
-    return worker;
+    return std::unique_ptr<SECSimulator>(new SECSimulator(*this, seedValue, WorkerTag()));
 }
 
 void SECSimulator::SetNortaPairs(const std::vector<SECNortaPair>& pairs) {

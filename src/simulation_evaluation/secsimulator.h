@@ -354,6 +354,13 @@ public:
     void Display() const;
 
 private:
+    struct WorkerTag {};
+    //! A worker of `master`: its generation model copied rather than rebuilt from the plan (the
+    //! prepared quantile tables take milliseconds per input), its own stream seeded by
+    //! SeedFromValue(seedValue).
+    SECSimulator(const SECSimulator& master, double seedValue, WorkerTag);
+    //! The names of the inputs in the results.
+    void SetResultNames();
     //! Algorithm 1: the inputs, fixed inputs, contingency table and R.
     void BuildGenerationModel();
     //! Adds one simulated input at case position `pos`.
