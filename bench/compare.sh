@@ -125,8 +125,8 @@ row fit-r W-FIT-1 fitdistrplus 1 1 "$wfit1_rows" "$out/wfit1-fitdistrplus.json" 
 echo "compare: W-SIM-1, $cases cases, $repeat runs each"
 # The subcommand is listed by `mcsim --help` once it exists.
 if "$mcsim" --help 2>/dev/null | grep -Eq '^[[:space:]]+simulate[[:space:]]'; then
-    for spec in "1 $core 1" "2 $core 1" "2 $cores2 2"; do
-        read -r threads cpus ncores <<<"$spec"
+    for setup in "1 $core 1" "2 $core 1" "2 $cores2 2"; do
+        read -r threads cpus ncores <<<"$setup"
         id=sim-mcsim-t$threads-c$ncores
         json=$out/wsim1-mcsim-t$threads-c$ncores.json
         t=$(run "$id" "$cpus" "$json" "$mcsim" simulate "$out/wsim1.xml" --cases "$cases" \

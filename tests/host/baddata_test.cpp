@@ -28,41 +28,10 @@
 
 namespace {
 
-struct CommandRun {
-    int status = -1; //!< exit status; -1 when the command did not exit normally (a crash)
-    std::string out; //!< standard output
-    std::string err; //!< standard error
-};
-
-std::string Quote(const std::string& s) {
-    std::string q = "'";
-    for (char c : s) {
-        q += (c == '\'') ? std::string("'\\''") : std::string(1, c);
-    }
-    return q + "'";
-}
+using hosttest::CommandRun;
 
 CommandRun Mcsim(const std::vector<std::string>& args, const hosttest::TempDir& dir) {
-    std::string command = Quote(MCSIM_EXE);
-    for (const std::string& a : args) {
-        command += " " + Quote(a);
-    }
-    const std::string errPath = dir.File("stderr.txt");
-    command += " 2>" + Quote(errPath) + " </dev/null";
-    CommandRun run;
-    FILE* pipe = ::popen(command.c_str(), "r");
-    if (!pipe) {
-        return run;
-    }
-    char buffer[4096];
-    std::size_t n = 0;
-    while ((n = std::fread(buffer, 1, sizeof buffer, pipe)) > 0) {
-        run.out.append(buffer, n);
-    }
-    const int raw = ::pclose(pipe);
-    run.status = WIFEXITED(raw) ? WEXITSTATUS(raw) : -1;
-    run.err = hosttest::ReadFile(errPath);
-    return run;
+    return hosttest::RunMcsim(args, dir.File("stderr.txt"));
 }
 
 //! The first word of `text` that spells a NaN or an infinity ("nan", "inf", "infinity" in any

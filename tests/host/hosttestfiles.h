@@ -4,11 +4,14 @@
 
 #include <gtest/gtest.h>
 
+#include <sys/wait.h>
+
 #include <filesystem>
 #include <fstream>
 #include <iterator>
 #include <sstream>
 #include <string>
+#include <vector>
 
 namespace hosttest {
 
@@ -60,5 +63,47 @@ inline std::string ReadFile(const std::string& path) {
     os << in.rdbuf();
     return os.str();
 }
+
+//! What one run of the mcsim command did.
+struct CommandRun {
+    int status = -1; //!< exit status; -1 when the command did not exit normally (a crash)
+    std::string out; //!< standard output
+    std::string err; //!< standard error
+};
+
+//! `s` quoted for the shell.
+inline std::string ShellQuote(const std::string& s) {
+    std::string q = "'";
+    for (char c : s) {
+        q += (c == '\'') ? std::string("'\\''") : std::string(1, c);
+    }
+    return q + "'";
+}
+
+#ifdef MCSIM_EXE
+//! Runs the mcsim command with `args`, standard input empty, standard error through the file
+//! `errPath`.
+inline CommandRun RunMcsim(const std::vector<std::string>& args, const std::string& errPath) {
+    std::string command = ShellQuote(MCSIM_EXE);
+    for (const std::string& a : args) {
+        command += " " + ShellQuote(a);
+    }
+    command += " 2>" + ShellQuote(errPath) + " </dev/null";
+    CommandRun run;
+    FILE* pipe = ::popen(command.c_str(), "r");
+    if (!pipe) {
+        return run;
+    }
+    char buffer[4096];
+    std::size_t n = 0;
+    while ((n = std::fread(buffer, 1, sizeof buffer, pipe)) > 0) {
+        run.out.append(buffer, n);
+    }
+    const int raw = ::pclose(pipe);
+    run.status = WIFEXITED(raw) ? WEXITSTATUS(raw) : -1;
+    run.err = ReadFile(errPath);
+    return run;
+}
+#endif
 
 } // namespace hosttest

@@ -24,42 +24,11 @@ namespace {
 
 const std::string kSales = std::string(MCSIM_EXAMPLES_DIR) + "/data/sales.csv";
 
-struct CommandRun {
-    int status = -1; //!< exit status
-    std::string out; //!< standard output
-    std::string err; //!< standard error
-};
-
-std::string Quote(const std::string& s) {
-    std::string q = "'";
-    for (char c : s) {
-        q += (c == '\'') ? std::string("'\\''") : std::string(1, c);
-    }
-    return q + "'";
-}
+using hosttest::CommandRun;
 
 //! Runs mcsim with `args`, standard error to a file of `dir`.
 CommandRun Mcsim(const std::vector<std::string>& args, const hosttest::TempDir& dir) {
-    std::string command = Quote(MCSIM_EXE);
-    for (const std::string& a : args) {
-        command += " " + Quote(a);
-    }
-    const std::string errPath = dir.File("stderr.txt");
-    command += " 2>" + Quote(errPath) + " </dev/null";
-    CommandRun run;
-    FILE* pipe = ::popen(command.c_str(), "r");
-    if (!pipe) {
-        return run;
-    }
-    char buffer[4096];
-    std::size_t n = 0;
-    while ((n = std::fread(buffer, 1, sizeof buffer, pipe)) > 0) {
-        run.out.append(buffer, n);
-    }
-    const int raw = ::pclose(pipe);
-    run.status = WIFEXITED(raw) ? WEXITSTATUS(raw) : -1;
-    run.err = hosttest::ReadFile(errPath);
-    return run;
+    return hosttest::RunMcsim(args, dir.File("stderr.txt"));
 }
 
 //! The lines of `text` from the one starting with `first` up to the next empty line.

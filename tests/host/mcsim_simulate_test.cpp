@@ -44,45 +44,16 @@ const std::string kModel = kExamples + "/models/demand.model";
 //! deviations of the correlation model's estimate.
 constexpr double kRhoSlack = 0.08;
 
-struct CommandRun {
-    int status = -1; //!< exit status
-    std::string out; //!< standard output
-    std::string err; //!< standard error
-};
-
-std::string Quote(const std::string& s) {
-    std::string q = "'";
-    for (char c : s) {
-        q += (c == '\'') ? std::string("'\\''") : std::string(1, c);
-    }
-    return q + "'";
-}
+using hosttest::CommandRun;
 
 //! Runs mcsim with `args`; standard error goes through a file outside `dir`'s listing checks.
 CommandRun Mcsim(const std::vector<std::string>& args) {
-    std::string command = Quote(MCSIM_EXE);
-    for (const std::string& a : args) {
-        command += " " + Quote(a);
-    }
     char errPath[] = "/tmp/mcsim_simulate_test_err_XXXXXX";
     const int fd = ::mkstemp(errPath);
     if (fd >= 0) {
         ::close(fd);
     }
-    command += " 2>" + Quote(errPath) + " </dev/null";
-    CommandRun run;
-    FILE* pipe = ::popen(command.c_str(), "r");
-    if (!pipe) {
-        return run;
-    }
-    char buffer[4096];
-    std::size_t n = 0;
-    while ((n = std::fread(buffer, 1, sizeof buffer, pipe)) > 0) {
-        run.out.append(buffer, n);
-    }
-    const int raw = ::pclose(pipe);
-    run.status = WIFEXITED(raw) ? WEXITSTATUS(raw) : -1;
-    run.err = hosttest::ReadFile(errPath);
+    CommandRun run = hosttest::RunMcsim(args, errPath);
     std::remove(errPath);
     return run;
 }
