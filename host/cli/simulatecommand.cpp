@@ -26,6 +26,7 @@
 
 #include <algorithm>
 #include <atomic>
+#include <cctype>
 #include <cerrno>
 #include <chrono>
 #include <cmath>
@@ -35,7 +36,6 @@
 #include <fstream>
 #include <map>
 #include <mutex>
-#include <regex>
 #include <sstream>
 #include <thread>
 
@@ -74,10 +74,27 @@ std::string ReadWholeFile(const std::string& path, const char* what) {
 
 //! The XML parser's "line L, column C: message" as "path:L:C: message".
 std::string XmlErrorMessage(const std::string& path, const std::string& message) {
-    static const std::regex kWhere(R"(^line (\d+), column (\d+): (.*)$)");
-    std::smatch m;
-    if (std::regex_match(message, m, kWhere)) {
-        return path + ":" + m[1].str() + ":" + m[2].str() + ": not well-formed XML: " + m[3].str();
+    // "line " digits ", column " digits ": " rest
+    const auto digitsAt = [&message](std::size_t pos) {
+        std::size_t end = pos;
+        while (end < message.size() && std::isdigit(static_cast<unsigned char>(message[end]))) {
+            ++end;
+        }
+        return end;
+    };
+    const std::string kLine = "line ";
+    const std::string kColumn = ", column ";
+    if (message.compare(0, kLine.size(), kLine) == 0) {
+        const std::size_t lineEnd = digitsAt(kLine.size());
+        if (lineEnd > kLine.size() && message.compare(lineEnd, kColumn.size(), kColumn) == 0) {
+            const std::size_t columnStart = lineEnd + kColumn.size();
+            const std::size_t columnEnd = digitsAt(columnStart);
+            if (columnEnd > columnStart && message.compare(columnEnd, 2, ": ") == 0) {
+                return path + ":" + message.substr(kLine.size(), lineEnd - kLine.size()) + ":" +
+                       message.substr(columnStart, columnEnd - columnStart) +
+                       ": not well-formed XML: " + message.substr(columnEnd + 2);
+            }
+        }
     }
     return LocatedMessage(path, 0, "not a readable XML document: " + message);
 }

@@ -17,7 +17,6 @@
 #include <cmath>
 #include <cstdio>
 #include <filesystem>
-#include <regex>
 #include <string>
 #include <sys/wait.h>
 #include <vector>
@@ -37,10 +36,28 @@ CommandRun Mcsim(const std::vector<std::string>& args, const hosttest::TempDir& 
 //! The first word of `text` that spells a NaN or an infinity ("nan", "inf", "infinity" in any
 //! case, also signed), or "" when there is none.
 std::string NonFiniteWord(const std::string& text) {
-    static const std::regex kWord("(^|[^A-Za-z0-9_])([-+]?(nan|inf|infinity))($|[^A-Za-z0-9_])",
-                                  std::regex::icase);
-    std::smatch m;
-    return std::regex_search(text, m, kWord) ? m[2].str() : std::string();
+    const auto isWordChar = [](char c) {
+        return std::isalnum(static_cast<unsigned char>(c)) != 0 || c == '_';
+    };
+    for (std::size_t i = 0; i < text.size();) {
+        if (!isWordChar(text[i])) {
+            ++i;
+            continue;
+        }
+        std::size_t end = i;
+        std::string lower;
+        while (end < text.size() && isWordChar(text[end])) {
+            lower += static_cast<char>(std::tolower(static_cast<unsigned char>(text[end++])));
+        }
+        if (lower == "nan" || lower == "inf" || lower == "infinity") {
+            const bool signedWord = i > 0 && (text[i - 1] == '-' || text[i - 1] == '+') &&
+                                    (i == 1 || !isWordChar(text[i - 2]));
+            const std::size_t start = signedWord ? i - 1 : i;
+            return text.substr(start, end - start);
+        }
+        i = end;
+    }
+    return std::string();
 }
 
 //! `n` lines "a,k,g" of ordinary rows: a continuous value, a small count, a category.
