@@ -47,8 +47,7 @@ struct LinearRun {
         tp.plan.SetMaxCases(cases);
         tp.AddInput("x0", simgen::MakeDist(kDistNormal, {{"mean", 10.0}, {"stddev", 2.0}}));
         tp.AddInput("x1", simgen::MakeDist(kDistUniform, {{"min", 0.0}, {"max", 4.0}}));
-        tp.AddInput("region",
-                    simgen::MakeCategorical({"north", "south", "west"}, {0.5, 0.3, 0.2}),
+        tp.AddInput("region", simgen::MakeCategorical({"north", "south", "west"}, {0.5, 0.3, 0.2}),
                     kLevelCategorical);
         SPCSettings::ModelFileTarget target;
         target.fName = "t";
@@ -77,8 +76,8 @@ struct LinearRun {
     MCStatus Simulate(MCXML_800::IMCSPScoreFactory* factory = nullptr,
                       MCXML_800::SECAppDataProcess* sink = nullptr) {
         auto linear = scorers::MakeFactory([this]() -> std::unique_ptr<IMCScoreComputer> {
-            return std::make_unique<scorers::LinearScorer>(
-                std::vector<LinearTarget>{Model()}, IMCScoreComputer::kRegression, &counter);
+            return std::make_unique<scorers::LinearScorer>(std::vector<LinearTarget>{Model()},
+                                                           IMCScoreComputer::kRegression, &counter);
         });
         return alg->SimulateData(factory != nullptr ? factory : &linear, sink);
     }
@@ -104,6 +103,19 @@ bool SameBits(const std::vector<double>& a, const std::vector<double>& b) {
            (a.empty() || std::memcmp(a.data(), b.data(), a.size() * sizeof(double)) == 0);
 }
 
+//! Builds `alg` and runs it with `factory` and `sink`; its single results, or null when a step
+//! fails.
+SECOutputStats* BuildAndSimulate(SECAlgorithm& alg, MCXML_800::IMCSPScoreFactory& factory,
+                                 MCXML_800::SECAppDataProcess* sink = nullptr) {
+    MCCommon_800::MCMemoryRecordIter data({MCXML_800::Record(1)});
+    SECOutputStats* res = nullptr;
+    if (!alg.BuildModel(data, nullptr).IsOK() || !alg.SimulateData(&factory, sink).IsOK() ||
+        !alg.GetOutputStats(res).IsOK()) {
+        return nullptr;
+    }
+    return res;
+}
+
 //! Collects what a sink receives.
 struct CollectingSink : MCXML_800::SECAppDataProcess {
     int fBegins = 0;
@@ -126,7 +138,8 @@ struct CollectingSink : MCXML_800::SECAppDataProcess {
 
 } // namespace
 
-// ---- The algorithm contract ----------------------------------------------------------------------
+// ---- The algorithm contract
+// ----------------------------------------------------------------------
 
 TEST(SECAlgorithmContract, BuildModelResultsAndExport) {
     LinearRun run(1, 7u, 100);
@@ -175,8 +188,7 @@ TEST(LinearModel, StatisticsAgreeWithTheModel) {
     // Correlation of t with x0: 2·2/√36.49; with x1: −3·(4/√12)/√36.49.
     ASSERT_EQ(t.fvPearsonCorrs.size(), 2u);
     EXPECT_NEAR(t.fvPearsonCorrs[0], 4.0 / std::sqrt(kTrueVariance), 0.01);
-    EXPECT_NEAR(t.fvPearsonCorrs[1], -3.0 * 4.0 / std::sqrt(12.0) / std::sqrt(kTrueVariance),
-                0.01);
+    EXPECT_NEAR(t.fvPearsonCorrs[1], -3.0 * 4.0 / std::sqrt(12.0) / std::sqrt(kTrueVariance), 0.01);
     EXPECT_NEAR(res.GetSimulCorr().GetElem(1, 0), 0.0, 0.01);
     EXPECT_EQ(res.GetCovarStats().size(), 2u);
     // Both measures off: every case scored once, plus the 1000 pilot cases.
@@ -225,8 +237,7 @@ TEST(LinearModel, ATargetIndependentOfAnInputHasNoEffectFromIt) {
         t.fName = "t";
         t.fvCoefs = {{"x0", 1.0}};
         return std::make_unique<scorers::LinearScorer>(std::vector<LinearTarget>{t},
-                                                       IMCScoreComputer::kTransformsOnly,
-                                                       nullptr);
+                                                       IMCScoreComputer::kTransformsOnly, nullptr);
     });
     ASSERT_TRUE(run.Run(&onlyX0).IsOK());
     const SECContinuousTargetInfo& t = run.Target();
@@ -244,8 +255,7 @@ TEST(LinearModel, ConstantTargetHasNoVarianceContribution) {
         t.fName = "t";
         t.fIntercept = 3.0;
         return std::make_unique<scorers::LinearScorer>(std::vector<LinearTarget>{t},
-                                                       IMCScoreComputer::kTransformsOnly,
-                                                       nullptr);
+                                                       IMCScoreComputer::kTransformsOnly, nullptr);
     });
     ASSERT_TRUE(run.Run(&constant).IsOK());
     const SECContinuousTargetInfo& t = run.Target();
@@ -277,8 +287,10 @@ TEST(SimulationThreads, SameSeedAndThreadCountGiveIdenticalResults) {
         EXPECT_EQ(ta.fHistogram.GetBinFreqCounts(), tb.fHistogram.GetBinFreqCounts());
         EXPECT_TRUE(SameBits(ta.fHistogram.GetBinMeans(), tb.fHistogram.GetBinMeans()));
         ASSERT_EQ(ta.fvScatterPlots.size(), 3u);
-        EXPECT_EQ(ta.fvScatterPlots[2].GetCellFreqCounts(), tb.fvScatterPlots[2].GetCellFreqCounts());
-        EXPECT_EQ(a.Results().GetSimulCorr().GetElem(1, 0), b.Results().GetSimulCorr().GetElem(1, 0));
+        EXPECT_EQ(ta.fvScatterPlots[2].GetCellFreqCounts(),
+                  tb.fvScatterPlots[2].GetCellFreqCounts());
+        EXPECT_EQ(a.Results().GetSimulCorr().GetElem(1, 0),
+                  b.Results().GetSimulCorr().GetElem(1, 0));
     }
 }
 
@@ -323,7 +335,8 @@ TEST(SimulationCancel, FromAnotherThreadEndsWithStatus1AndMergedResults) {
     EXPECT_NEAR(run.Target().fMean, kTrueMean, 0.3);
 }
 
-// ---- Stop criteria --------------------------------------------------------------------------------
+// ---- Stop criteria
+// --------------------------------------------------------------------------------
 
 TEST(StopCriteria, PointValueNeverStopsBefore1000Weights) {
     LinearRun loose(4, 2u, 100000);
@@ -366,7 +379,8 @@ TEST(StopCriteria, ValueTailStopsOnceActiveAndCounted) {
     EXPECT_NEAR(run.Results().GetValidCaseCount(), 6100, 600);
 }
 
-// ---- Kinds of score ------------------------------------------------------------------------------
+// ---- Kinds of score
+// ------------------------------------------------------------------------------
 
 TEST(ScoreKinds, CategoricalPredictionWithProbabilities) {
     // x ~ Beta(2, 5): P(high) = P(x > 0.5) = 1 − 57/64; mean P(high) = E[x] = 2/7.
@@ -381,12 +395,9 @@ TEST(ScoreKinds, CategoricalPredictionWithProbabilities) {
             return std::make_unique<scorers::CategoricalScorer>("x", probs);
         });
         SECAlgorithm alg(tp.settings, tp.plan, tp.vars);
-        MCCommon_800::MCMemoryRecordIter data({MCXML_800::Record(1)});
-        ASSERT_TRUE(alg.BuildModel(data, nullptr).IsOK());
         CollectingSink sink;
-        ASSERT_TRUE(alg.SimulateData(&factory, &sink).IsOK());
-        SECOutputStats* res = nullptr;
-        ASSERT_TRUE(alg.GetOutputStats(res).IsOK());
+        SECOutputStats* res = BuildAndSimulate(alg, factory, &sink);
+        ASSERT_NE(res, nullptr);
         ASSERT_EQ(res->GetCateTargetInfo().size(), 1u);
         const SECCategoricalTargetInfo& t = res->GetCateTargetInfo()[0];
         EXPECT_EQ(t.fName, "risk");
@@ -414,11 +425,8 @@ TEST(ScoreKinds, ClusterIdentifierIsACategoricalTargetNamedByThePlan) {
         return std::make_unique<scorers::ClusterScorer>("x", 0.25);
     });
     SECAlgorithm alg(tp.settings, tp.plan, tp.vars);
-    MCCommon_800::MCMemoryRecordIter data({MCXML_800::Record(1)});
-    ASSERT_TRUE(alg.BuildModel(data, nullptr).IsOK());
-    ASSERT_TRUE(alg.SimulateData(&factory, nullptr).IsOK());
-    SECOutputStats* res = nullptr;
-    ASSERT_TRUE(alg.GetOutputStats(res).IsOK());
+    SECOutputStats* res = BuildAndSimulate(alg, factory);
+    ASSERT_NE(res, nullptr);
     ASSERT_EQ(res->GetCateTargetInfo().size(), 1u);
     const SECCategoricalTargetInfo& t = res->GetCateTargetInfo()[0];
     EXPECT_EQ(t.fName, "segment");
@@ -437,8 +445,7 @@ TEST(ScoreKinds, TransformationWithTwoTargetsReadsEveryField) {
         twice.fName = "twice";
         twice.fvCoefs = {{"x0", 2.0}};
         return std::make_unique<scorers::LinearScorer>(std::vector<LinearTarget>{sum, twice},
-                                                       IMCScoreComputer::kTransformsOnly,
-                                                       nullptr);
+                                                       IMCScoreComputer::kTransformsOnly, nullptr);
     });
     ASSERT_TRUE(run.Run(&two).IsOK());
     const std::vector<SECContinuousTargetInfo>& targets = run.Results().GetContTargetInfo();
@@ -467,7 +474,8 @@ TEST(ScoreKinds, TargetFilterRejectsAndCountsFilteredAttempts) {
     EXPECT_GE(run.Target().fHistogram.GetMinimum(), 15.9);
 }
 
-// ---- Scatter-plot budget ----------------------------------------------------------------------------
+// ---- Scatter-plot budget
+// ----------------------------------------------------------------------------
 
 TEST(ScatterBudget, AHundredPlotsOverAllIterations) {
     struct Case {
@@ -499,7 +507,8 @@ TEST(ScatterBudget, AHundredPlotsOverAllIterations) {
     }
 }
 
-// ---- Several sensitivity iterations --------------------------------------------------------------
+// ---- Several sensitivity iterations
+// --------------------------------------------------------------
 
 TEST(SensitivityIterations, OneResultPerIteration) {
     LinearRun run(2, 21u, 3000);
@@ -519,12 +528,13 @@ TEST(SensitivityIterations, OneResultPerIteration) {
     EXPECT_NE(all[0]->GetContTargetInfo()[0].fMean, all[1]->GetContTargetInfo()[0].fMean);
 }
 
-// ---- Host-driven way --------------------------------------------------------------------------------
+// ---- Host-driven way
+// --------------------------------------------------------------------------------
 
 TEST(HostDriven, StartupRecordsFixTheRangesThenEveryRecordCounts) {
     LinearRun run(1, 17u, 1000000);
-    SECAlgorithm& alg = *(run.alg = std::make_unique<SECAlgorithm>(run.tp.settings, run.tp.plan,
-                                                                   run.tp.vars));
+    SECAlgorithm& alg =
+        *(run.alg = std::make_unique<SECAlgorithm>(run.tp.settings, run.tp.plan, run.tp.vars));
     MCCommon_800::MCMemoryRecordIter data({MCXML_800::Record(1)});
     ASSERT_TRUE(alg.BuildModel(data, nullptr).IsOK());
     ASSERT_TRUE(alg.PrepareGeneration(-1).IsOK());
@@ -572,7 +582,8 @@ TEST(HostDriven, TooFewStartupRecordsFail) {
     EXPECT_EQ(last.GetErrorCode(), MCSPStatus::kNoValidCase);
 }
 
-// ---- Failures -------------------------------------------------------------------------------------
+// ---- Failures
+// -------------------------------------------------------------------------------------
 
 TEST(SimulationFailures, ModelErrorsExceptionsAndExhaustedAttempts) {
     const auto failing = [](double share, long long throwAfter) {
@@ -617,7 +628,8 @@ TEST(SimulationFailures, ModelErrorsExceptionsAndExhaustedAttempts) {
     }
 }
 
-// ---- Completion of the inputs' results -----------------------------------------------------------
+// ---- Completion of the inputs' results
+// -----------------------------------------------------------
 
 TEST(Completion, CellSharesAndCorrelationsInThePlansOrder) {
     simgen::TestPlan tp;
@@ -646,15 +658,11 @@ TEST(Completion, CellSharesAndCorrelationsInThePlansOrder) {
         t.fName = "t";
         t.fvCoefs = {{"a", 1.0}, {"c", 1.0}};
         return std::make_unique<scorers::LinearScorer>(std::vector<LinearTarget>{t},
-                                                       IMCScoreComputer::kTransformsOnly,
-                                                       nullptr);
+                                                       IMCScoreComputer::kTransformsOnly, nullptr);
     });
     SECAlgorithm alg(tp.settings, tp.plan, tp.vars);
-    MCCommon_800::MCMemoryRecordIter data({MCXML_800::Record(1)});
-    ASSERT_TRUE(alg.BuildModel(data, nullptr).IsOK());
-    ASSERT_TRUE(alg.SimulateData(&factory, nullptr).IsOK());
-    SECOutputStats* res = nullptr;
-    ASSERT_TRUE(alg.GetOutputStats(res).IsOK());
+    SECOutputStats* res = BuildAndSimulate(alg, factory);
+    ASSERT_NE(res, nullptr);
     const std::vector<double>& shares = res->GetCrstSimProbs();
     ASSERT_EQ(shares.size(), 4u);
     for (std::size_t i = 0; i < 4; ++i) {
@@ -702,15 +710,11 @@ TEST(LinearModel, VarianceContributionDoesNotMoveWithTheTargetsLocation) {
         far.fName = "far";
         far.fIntercept = 1000.0;
         return std::make_unique<scorers::LinearScorer>(std::vector<LinearTarget>{near, far},
-                                                       IMCScoreComputer::kTransformsOnly,
-                                                       nullptr);
+                                                       IMCScoreComputer::kTransformsOnly, nullptr);
     });
     SECAlgorithm alg(tp.settings, tp.plan, tp.vars);
-    MCCommon_800::MCMemoryRecordIter data({MCXML_800::Record(1)});
-    ASSERT_TRUE(alg.BuildModel(data, nullptr).IsOK());
-    ASSERT_TRUE(alg.SimulateData(&factory, nullptr).IsOK());
-    SECOutputStats* res = nullptr;
-    ASSERT_TRUE(alg.GetOutputStats(res).IsOK());
+    SECOutputStats* res = BuildAndSimulate(alg, factory);
+    ASSERT_NE(res, nullptr);
     const std::vector<SECContinuousTargetInfo>& t = res->GetContTargetInfo();
     for (std::size_t k = 0; k < 2; ++k) {
         EXPECT_NEAR(t[0].fvVarianceContrib[k], t[1].fvVarianceContrib[k], 1e-6) << k;
