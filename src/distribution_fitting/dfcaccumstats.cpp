@@ -754,47 +754,97 @@ bool DFCAccumStatsWeibTwo::BuildLogCache() {
 // v_i^b is evaluated as exp(b·(ln v_i - ln v_max)): the common factor v_max^b cancels in the
 // ratio, and no term overflows for large b or large values. F falls monotonically from +∞
 // (b → 0) to S/W - ln v_max < 0 (b → ∞) unless all values are equal, so the root is unique.
-double DFCAccumStatsWeibTwo::EvaluateRootFunction(double x) {
+// Its slope is F'(b) = -1/b² - Var_b(ln v), the variance of ln v under the weights w_i·v_i^b,
+// taken about ln v_max (a shift leaves a variance unchanged and keeps the terms small).
+bool DFCAccumStatsWeibTwo::EvaluateEquation(double b, double& f, double& slope, double& sumPow) {
     const double w = GetEquationWeight();
-    if (!(x > 0.0) || !(w > 0.0) || !BuildLogCache()) {
-        return MCMV::Missing();
+    if (!(b > 0.0) || !(w > 0.0) || !BuildLogCache()) {
+        return false;
     }
-    double sumPow = 0.0;
-    double sumPowLog = 0.0;
+    const bool weighted = !fvLogWeights.empty();
+    double s0 = 0.0;
+    double s1 = 0.0;
+    double s2 = 0.0;
     for (std::size_t i = 0; i < fvLogValues.size(); ++i) {
-        const double weight = fvLogWeights.empty() ? 1.0 : fvLogWeights[i];
-        const double term = weight * std::exp(x * (fvLogValues[i] - fMaxLogValue));
-        sumPow += term;
-        sumPowLog += term * fvLogValues[i];
+        const double d = fvLogValues[i] - fMaxLogValue;
+        const double term = (weighted ? fvLogWeights[i] : 1.0) * std::exp(b * d);
+        s0 += term;
+        s1 += term * d;
+        s2 += term * d * d;
     }
-    const double f = fSumLogXi / w + 1.0 / x - sumPowLog / sumPow;
-    return std::isfinite(f) ? f : MCMV::Missing();
+    const double meanD = s1 / s0;
+    f = fSumLogXi / w + 1.0 / b - (fMaxLogValue + meanD);
+    slope = -1.0 / (b * b) - std::max(0.0, s2 / s0 - meanD * meanD);
+    sumPow = s0;
+    return std::isfinite(f) && std::isfinite(slope) && s0 > 0.0;
 }
 
+double DFCAccumStatsWeibTwo::EvaluateRootFunction(double x) {
+    double f = 0.0;
+    double slope = 0.0;
+    double sumPow = 0.0;
+    return EvaluateEquation(x, f, slope, sumPow) ? f : MCMV::Missing();
+}
+
+// The root by Newton's method kept inside a bracket (Press et al., "Numerical Recipes", 3rd
+// ed., 2007, section 9.4, rtsafe): F is decreasing, so every evaluation moves one end of the
+// bracket (0, ∞) of the root; a Newton step that would leave the bracket is replaced by
+// bisection, or by doubling or halving while an end is still open. Newton converges in a few
+// steps from the moment estimate where bisection needs about twenty passes over the data.
+// It stops when |F| ≤ kRootTolerance, as the generic search does, or when the bracket can no
+// longer be split, and fails where the generic search finds no bracket: beyond 2^10 times or
+// below 2^-10 times the start (all values equal, where F = 1/b has no root, for one).
 bool DFCAccumStatsWeibTwo::SolveParameters() {
     std::vector<double>& theta = *fpParameters;
-    if (theta.size() < 2) {
+    if (theta.size() < 2 || !(theta[1] > 0.0) || !std::isfinite(theta[1])) {
         return FailRootSearch();
     }
-    const double root = FindRoot(theta[1]);
-    if (MCMV::IsMissing(root) || !BuildLogCache()) {
+    constexpr int kMaxSteps = 200;
+    const double reachLo = std::ldexp(theta[1], -kBracketSteps);
+    const double reachHi = std::ldexp(theta[1], kBracketSteps);
+    double lo = 0.0;
+    double hi = std::numeric_limits<double>::infinity();
+    double b = theta[1];
+    double sumPow = 0.0;
+    bool solved = false;
+    for (int step = 0; step < kMaxSteps; ++step) {
+        double f = 0.0;
+        double slope = 0.0;
+        if (!EvaluateEquation(b, f, slope, sumPow)) {
+            break;
+        }
+        if (std::fabs(f) <= kRootTolerance) {
+            solved = true;
+            break;
+        }
+        (f > 0.0 ? lo : hi) = b;
+        double next = b - f / slope;
+        if (!(slope < 0.0) || !(next > lo && next < hi)) {
+            next = std::isfinite(hi) ? (lo > 0.0 ? 0.5 * (lo + hi) : 0.5 * hi) : 2.0 * lo;
+        }
+        if (!(next >= reachLo && next <= reachHi)) {
+            break;
+        }
+        if (!(next > lo && next < hi) || next == b) {
+            // The bracket cannot be split any further: b is the root to the last bit.
+            solved = EvaluateEquation(b, f, slope, sumPow);
+            break;
+        }
+        b = next;
+    }
+    if (!solved) {
         ReleaseLogCache();
         return FailRootSearch();
-    }
-    double sumPow = 0.0;
-    for (std::size_t i = 0; i < fvLogValues.size(); ++i) {
-        const double weight = fvLogWeights.empty() ? 1.0 : fvLogWeights[i];
-        sumPow += weight * std::exp(root * (fvLogValues[i] - fMaxLogValue));
     }
     // The cache is as large as the field; the goodness-of-fit tasks of every field hold their
     // Weibull at once, so each gives its memory back once solved.
     ReleaseLogCache();
-    const double scale = std::exp(fMaxLogValue + std::log(sumPow / GetEquationWeight()) / root);
+    const double scale = std::exp(fMaxLogValue + std::log(sumPow / GetEquationWeight()) / b);
     if (!std::isfinite(scale) || !(scale > 0.0)) {
         return FailRootSearch();
     }
     theta[0] = scale;
-    theta[1] = root;
+    theta[1] = b;
     fStatus = MCStatus();
     return true;
 }

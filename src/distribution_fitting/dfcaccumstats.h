@@ -304,6 +304,9 @@ private:
     bool BuildLogCache();
     //! Frees the cache (it is rebuilt when needed again).
     void ReleaseLogCache();
+    //! F(b) of the likelihood equation, its slope F'(b) and Σ w_i·v_i^b / v_max^b; false
+    //! where they are not defined.
+    bool EvaluateEquation(double b, double& f, double& slope, double& sumPow);
     //! W of the likelihood equation: the accumulated weight, or the total weight when unset.
     double GetEquationWeight() const { return fAccumWeight > 0.0 ? fAccumWeight : fTotalWeight; }
 

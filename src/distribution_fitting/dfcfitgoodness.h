@@ -59,13 +59,29 @@ public:
     //! F(x); missing when the parameters admit no distribution function (too few, not
     //! finite, a scale that is not positive) or the library gives none.
     double operator()(double x) const;
+    //! u_i = F(x_i) for `n` values in ascending order (ties get the same u), as operator()
+    //! gives them to within about 1e-13 relative, far cheaper for the Gamma and the Beta:
+    //! between exact values every 32 entries, F is carried from entry to entry by integrating
+    //! the density (see the .cpp).
+    void EvaluateSorted(const double* x, std::size_t n, double* u) const;
 
 private:
+    //! The exact F(x) (`upper` false) or 1 - F(x) (`upper` true) of the Gamma or the Beta.
+    double ExactTail(double x, bool upper) const;
+    //! The density f(x) of the Gamma or the Beta and its relative slope f'(x)/f(x); false
+    //! outside the open support or where either is not finite.
+    bool Density(double x, double& f, double& slope) const;
+    //! Carries F over the entries [begin, end] of one stretch (see the .cpp); false when
+    //! the carried value misses the exact one at the far end, `u` then holds only the ends.
+    bool CarryStretch(const double* x, std::size_t begin, std::size_t end, double* u,
+                      double* work) const;
+
     MCSPConst::DistType fType; //!< candidate type
     double fP0 = 0.0;          //!< first parameter
     double fP1 = 0.0;          //!< second parameter
     double fP2 = 0.0;          //!< third parameter
     bool fbValid = false;      //!< the parameters are usable
+    double fLogNorm = 0.0;     //!< ln Γ(α) - α·ln β (Gamma) or ln B(a, b) (Beta)
 };
 
 //! Running sums of the EDF statistics over sorted probabilities u_1 ≤ u_2 ≤ ..., so that they

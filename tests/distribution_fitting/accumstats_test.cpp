@@ -435,6 +435,11 @@ TEST(RootSearchFailure, WeibullWithoutUsableData) {
     DFCAccumStatsWeibTwo noWeight(settings, p, {0}, 4.0, {1.75}, {2.0});
     noWeight.SetData(&entries, &shortWeights, 4.0, 0.0);
     EXPECT_FALSE(noWeight.SolveParameters());
+    // All values equal: F(b) = 1/b has no root; the search must not run off to a huge shape.
+    const std::vector<DFCGoodFitEntry> same = SortedEntries({2.5, 2.5, 2.5, 2.5});
+    DFCAccumStatsWeibTwo constant(settings, p, {0}, 4.0, {2.5}, {0.0});
+    constant.SetData(&same, nullptr, 4.0, 4.0 * std::log(2.5));
+    EXPECT_FALSE(constant.SolveParameters());
     // No entries at all.
     DFCAccumStatsWeibTwo empty(settings, p, {0}, 4.0, {1.75}, {2.0});
     EXPECT_FALSE(empty.SolveParameters());

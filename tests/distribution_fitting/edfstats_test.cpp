@@ -137,6 +137,78 @@ TEST_P(CdfReference, MatchesFortyDigits) {
 
 INSTANTIATE_TEST_SUITE_P(Points, CdfReference, ::testing::ValuesIn(gofref::kCdfCases), ByName());
 
+// F over sorted values: the carried values against the exact ones, value by value.
+
+struct SortedCdfCase {
+    const char* name;
+    DistType type;
+    std::vector<double> params;
+    std::size_t n;
+};
+
+//! n sorted values: quantiles of a grid with a fixed jitter, every seventh value repeated,
+//! and a few outliers far beyond the bulk and outside the support.
+std::vector<double> SortedValues(const SortedCdfCase& c) {
+    std::vector<double> x;
+    const bool beta = c.type == kDistBeta;
+    for (std::size_t i = 0; i < c.n; ++i) {
+        const double p = (static_cast<double>(i) + 0.5 + 0.4 * std::sin(3.7 * i)) / c.n;
+        // Quantiles by bisection on the exact F: slow, independent of the code under test.
+        const DFCFittedCdf cdf(c.type, c.params);
+        double lo = 0.0;
+        double hi = beta ? 1.0 : 1e4;
+        for (int k = 0; k < 200 && hi - lo > 1e-15 * hi; ++k) {
+            const double mid = 0.5 * (lo + hi);
+            (cdf(mid) < p ? lo : hi) = mid;
+        }
+        x.push_back(0.5 * (lo + hi));
+        if (i % 7 == 0) {
+            x.push_back(x.back());
+        }
+    }
+    for (double far : {beta ? 0.0 : -1.0, beta ? 1.0 : 5e3, beta ? 0.999999 : 900.0}) {
+        x.push_back(far);
+    }
+    std::sort(x.begin(), x.end());
+    return x;
+}
+
+class SortedCdf : public ::testing::TestWithParam<SortedCdfCase> {};
+
+TEST_P(SortedCdf, MatchesTheExactFunctionValueByValue) {
+    const SortedCdfCase& c = GetParam();
+    const std::vector<double> x = SortedValues(c);
+    const DFCFittedCdf cdf(c.type, c.params);
+    std::vector<double> u(x.size());
+    cdf.EvaluateSorted(x.data(), x.size(), u.data());
+    std::vector<double> exact(x.size());
+    for (std::size_t i = 0; i < x.size(); ++i) {
+        exact[i] = cdf(x[i]);
+        // Each tail keeps its relative accuracy; 1 - F only as far as F itself resolves it.
+        const double scale = std::min(exact[i], 1.0 - exact[i]);
+        ASSERT_NEAR(u[i], exact[i], 1e-12 * scale + 4e-16) << "x = " << x[i] << ", i = " << i;
+        if (i > 0 && x[i] == x[i - 1]) {
+            ASSERT_EQ(u[i], u[i - 1]);
+        }
+    }
+    // A² of quantiles is nearly 0: its error is absolute, n terms of about 1e-12 each at most.
+    const double n = static_cast<double>(x.size());
+    EXPECT_NEAR(ComputeAndersonDarling(u.data(), nullptr, u.size(), n),
+                ComputeAndersonDarling(exact.data(), nullptr, exact.size(), n), 1e-12 * n);
+}
+
+INSTANTIATE_TEST_SUITE_P(
+    Table, SortedCdf,
+    ::testing::Values(SortedCdfCase{"GammaShape2_5", kDistGamma, {2.5, 0.25}, 5000},
+                      SortedCdfCase{"GammaPoleAtZero", kDistGamma, {0.3, 2.0}, 5000},
+                      SortedCdfCase{"GammaLargeShape", kDistGamma, {400.0, 4.0}, 3000},
+                      SortedCdfCase{"GammaFewValues", kDistGamma, {2.5, 0.25}, 40},
+                      SortedCdfCase{"Beta2_5", kDistBeta, {2.0, 5.0}, 5000},
+                      SortedCdfCase{"BetaPolesAtBothEnds", kDistBeta, {0.5, 0.7}, 5000},
+                      SortedCdfCase{"BetaLargeShapes", kDistBeta, {300.0, 500.0}, 3000},
+                      SortedCdfCase{"NormalIsExact", kDistNormal, {0.5, 0.2}, 500}),
+    ByName());
+
 struct BadCdf {
     const char* name;
     DistType type;

@@ -38,6 +38,28 @@ void ChanPool(double wB, double meanB, double m2B, double& wA, double& meanA, do
     wA = w;
 }
 
+//! Adds c·d·dᵀ to the packed lower triangle `packed` (row i holds i + 1 entries).
+void AddOuterProduct(int n, double c, const double* d, double* packed) {
+    for (int i = 0; i < n; ++i) {
+        const double di = c * d[i];
+        for (int j = 0; j <= i; ++j) {
+            packed[j] += di * d[j];
+        }
+        packed += i + 1;
+    }
+}
+
+//! The same for a size known when compiling, so that the loops unroll.
+template <int N> void AddOuterProduct(double c, const double* d, double* packed) {
+    for (int i = 0; i < N; ++i) {
+        const double di = c * d[i];
+        for (int j = 0; j <= i; ++j) {
+            packed[j] += di * d[j];
+        }
+        packed += i + 1;
+    }
+}
+
 //! A variance from a sum of squared deviations: missing when that sum overflowed.
 double FiniteOrMissing(double x) {
     return std::isfinite(x) ? x : MCMV::Missing();
@@ -283,13 +305,34 @@ bool MCProvMeans::Update(const double* values, int n, double weight) {
         means[i] = MoveMean(means[i], values[i], d, r);
     }
     if (fbKeepXProds && wOld > 0.0) {
-        double* row = fvXProdSums.data(); // row i of the packed triangle: i + 1 entries
-        for (int i = 0; i < n; ++i) {
-            const double di = rc * delta[i];
-            for (int j = 0; j <= i; ++j) {
-                row[j] += di * delta[j];
-            }
-            row += i + 1;
+        // A simulation updates a handful of variables per case: the loops unrolled for its
+        // sizes run several times faster than the general triangle (same operations, same
+        // order, same result).
+        switch (n) {
+        case 2:
+            AddOuterProduct<2>(rc, delta, fvXProdSums.data());
+            break;
+        case 3:
+            AddOuterProduct<3>(rc, delta, fvXProdSums.data());
+            break;
+        case 4:
+            AddOuterProduct<4>(rc, delta, fvXProdSums.data());
+            break;
+        case 5:
+            AddOuterProduct<5>(rc, delta, fvXProdSums.data());
+            break;
+        case 6:
+            AddOuterProduct<6>(rc, delta, fvXProdSums.data());
+            break;
+        case 7:
+            AddOuterProduct<7>(rc, delta, fvXProdSums.data());
+            break;
+        case 8:
+            AddOuterProduct<8>(rc, delta, fvXProdSums.data());
+            break;
+        default:
+            AddOuterProduct(n, rc, delta, fvXProdSums.data());
+            break;
         }
         fbXProdsStale = true;
     }
