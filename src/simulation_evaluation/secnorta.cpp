@@ -7,6 +7,7 @@
 
 #include <algorithm>
 #include <cmath>
+#include <vector>
 
 namespace MCMCSP_800 {
 
@@ -23,33 +24,59 @@ constexpr double kRepairEpsilon = 1e-6;
 
 } // namespace
 
-double SECNortaPairCorrelation(const SECInputGenerator& first, const SECInputGenerator& second,
-                               double r, int nPairs, MCMath_800::MCURandom& stream,
-                               std::uint32_t seed) {
-    if (!(r >= -1.0 && r <= 1.0) || nPairs < 2) {
-        return MCMV::Missing();
-    }
-    MCMath_800::MCSymMatrix correlation(2);
-    correlation.SetElem(0, 0, 1.0);
-    correlation.SetElem(1, 1, 1.0);
-    correlation.SetElem(1, 0, r);
+namespace {
+
+//! The common random numbers of one pair (see the header): the independent standard normals
+//! (z0_k, z1_k) of its draws and the first input's transformed values T0(z0_k), which do not
+//! depend on r. The pair (z0, r·z0 + √(1 − r²)·z1) is the product of the 2 x 2 Cholesky
+//! factor with (z0, z1), so each estimate of g only transforms the second coordinate again.
+struct PairSample {
+    std::vector<double> fZ0;
+    std::vector<double> fZ1;
+    std::vector<double> fY0;
+};
+
+//! Draws the sample from `stream` restarted at `seed`; false when a transformed value is
+//! missing (g is then missing for every r).
+bool DrawPairSample(const SECInputGenerator& first, int nPairs, MCMath_800::MCURandom& stream,
+                    std::uint32_t seed, PairSample& sample) {
     MCMath_800::MCRandomValues normal;
     normal.SetURNGPtr(&stream);
-    if (!normal.SetParamNormal({0.0, 0.0}, 1.0, correlation)) {
-        return MCMV::Missing();
+    if (nPairs < 2 || !normal.SetParamNormal(2)) {
+        return false;
     }
     stream.SetSeed(seed);
-    MCMath_800::MCProvMeans accumulator(2, true);
+    const auto n = static_cast<std::size_t>(nPairs);
+    sample.fZ0.resize(n);
+    sample.fZ1.resize(n);
+    sample.fY0.resize(n);
     std::vector<double> z(2);
-    double transformed[2];
-    for (int k = 0; k < nPairs; ++k) {
+    for (std::size_t k = 0; k < n; ++k) {
         if (!normal.GetRandom(z)) {
-            return MCMV::Missing();
+            return false;
         }
-        transformed[0] = SECTransform(first, z[0]);
-        transformed[1] = SECTransform(second, z[1]);
-        if (MCMV::IsMissing(transformed[0]) || MCMV::IsMissing(transformed[1]) ||
-            !accumulator.Update(transformed, 2, 1.0)) {
+        sample.fZ0[k] = z[0];
+        sample.fZ1[k] = z[1];
+        sample.fY0[k] = SECTransform(first, z[0]);
+        if (MCMV::IsMissing(sample.fY0[k])) {
+            return false;
+        }
+    }
+    return true;
+}
+
+//! g(r) over a drawn sample.
+double SampleCorrelation(const PairSample& sample, const SECInputGenerator& second, double r) {
+    if (!(r >= -1.0 && r <= 1.0)) {
+        return MCMV::Missing();
+    }
+    const double c = std::sqrt(1.0 - r * r);
+    MCMath_800::MCProvMeans accumulator(2, true);
+    double transformed[2];
+    for (std::size_t k = 0; k < sample.fZ0.size(); ++k) {
+        transformed[0] = sample.fY0[k];
+        transformed[1] = SECTransform(second, r * sample.fZ0[k] + c * sample.fZ1[k]);
+        if (MCMV::IsMissing(transformed[1]) || !accumulator.Update(transformed, 2, 1.0)) {
             return MCMV::Missing();
         }
     }
@@ -60,6 +87,21 @@ double SECNortaPairCorrelation(const SECInputGenerator& first, const SECInputGen
         return MCMV::Missing();
     }
     return xprods.GetElem(0, 1) / std::sqrt(v1 * v0);
+}
+
+} // namespace
+
+double SECNortaPairCorrelation(const SECInputGenerator& first, const SECInputGenerator& second,
+                               double r, int nPairs, MCMath_800::MCURandom& stream,
+                               std::uint32_t seed) {
+    if (!(r >= -1.0 && r <= 1.0)) {
+        return MCMV::Missing();
+    }
+    PairSample sample;
+    if (!DrawPairSample(first, nPairs, stream, seed, sample)) {
+        return MCMV::Missing();
+    }
+    return SampleCorrelation(sample, second, r);
 }
 
 SECNortaSearchResult SECNortaSearch(double rho, const std::function<double(double)>& g,
@@ -127,12 +169,13 @@ SECNortaSearchResult SECNortaNormalCorrelation(const SECInputGenerator& first,
         result.fNormalCorr = rho;
         return result;
     }
+    // The sample is drawn once for the whole search (common random numbers).
+    PairSample sample;
+    const bool drawn =
+        DrawPairSample(first, SECGenerationConst::kNortaSampleSize, stream, seed, sample);
     return SECNortaSearch(
         rho,
-        [&](double r) {
-            return SECNortaPairCorrelation(first, second, r, SECGenerationConst::kNortaSampleSize,
-                                           stream, seed);
-        },
+        [&](double r) { return drawn ? SampleCorrelation(sample, second, r) : MCMV::Missing(); },
         cancel);
 }
 
