@@ -571,6 +571,11 @@ CLI::App* AddFitCommand(CLI::App& app, FitOptions& options) {
                     "Whole-number fields with at most this many distinct values are ordinal")
         ->check(CLI::Range(1, 1000))
         ->capture_default_str();
+    fit->add_option("--cache-mb", options.fCacheMegabytes,
+                    "Megabytes for keeping the data in memory after its first reading (0: read "
+                    "the file again for every data pass)")
+        ->check(CLI::Range(std::uint64_t{0}, std::uint64_t{1} << 30))
+        ->capture_default_str();
     fit->add_option("-o,--output", options.fPlanPath,
                     "Write the simulation plan to this file (XML)");
     fit->add_option("--fit-stats", options.fFitStatsPath,
@@ -597,6 +602,7 @@ int RunFit(const FitOptions& options, std::ostream& out, std::ostream& err) {
         dataOptions.fDelimiter = ParseDelimiter(options.fDelimiter);
         dataOptions.fLevels = CollectLevels(options);
         dataOptions.fMaxOrdinalValues = options.fMaxOrdinalValues;
+        dataOptions.fMaxCacheBytes = options.fCacheMegabytes << 20;
         if (!options.fvFields.empty()) {
             dataOptions.fvFields = options.fvFields;
             for (const std::string& name : options.fvFactors) {

@@ -9,6 +9,7 @@
 
 #include <CLI/CLI.hpp>
 
+#include <cstdint>
 #include <ostream>
 #include <string>
 #include <vector>
@@ -29,6 +30,9 @@ struct FitOptions {
     int fThreads = 0;                   //!< worker threads, 0 one per processor
     std::string fDelimiter = ",";       //!< field separator ("tab" for a tab)
     int fMaxOrdinalValues = 20;         //!< ordinal inference threshold
+    //! Megabytes of the data kept in memory after the first reading for the fitting's passes
+    //! (0: the file is read again for every pass).
+    std::uint64_t fCacheMegabytes = 256;
     bool fbProgress = true;             //!< progress bar when stderr is a terminal
     std::string fPlanPath;              //!< -o: the plan file to write, "" none
     std::string fFitStatsPath;          //!< --fit-stats: the statistics document, "" none

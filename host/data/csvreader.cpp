@@ -2,6 +2,8 @@
 
 #include "common/hosterror.h"
 
+#include <algorithm>
+
 namespace MCHost {
 
 namespace {
@@ -26,25 +28,29 @@ CsvReader::CsvReader(std::istream& in, std::string fileName, char delimiter)
         const std::streamsize got = fpBuf->sgetn(mark, 3);
         if (got == 3 && static_cast<unsigned char>(mark[1]) == 0xBB &&
             static_cast<unsigned char>(mark[2]) == 0xBF) {
-            fBytesRead = 3;
+            fBytesFetched = 3;
         } else {
             fpBuf->pubseekpos(start, std::ios::in);
         }
     }
 }
 
-int CsvReader::Next() {
-    const int c = fpBuf ? fpBuf->sbumpc() : std::char_traits<char>::eof();
-    if (c == std::char_traits<char>::eof()) {
-        return -1;
+bool CsvReader::Fill() {
+    if (!fpBuf) {
+        return false;
     }
-    ++fBytesRead;
-    return static_cast<unsigned char>(c);
-}
-
-int CsvReader::Peek() {
-    const int c = fpBuf ? fpBuf->sgetc() : std::char_traits<char>::eof();
-    return c == std::char_traits<char>::eof() ? -1 : static_cast<unsigned char>(c);
+    if (fvBuffer.empty()) {
+        fvBuffer.resize(kBufferBytes);
+    }
+    const std::streamsize got =
+        fpBuf->sgetn(fvBuffer.data(), static_cast<std::streamsize>(fvBuffer.size()));
+    if (got <= 0) {
+        return false;
+    }
+    fPos = 0;
+    fEnd = static_cast<std::size_t>(got);
+    fBytesFetched += static_cast<std::uint64_t>(got);
+    return true;
 }
 
 void CsvReader::EndLine(int c) {
@@ -54,25 +60,62 @@ void CsvReader::EndLine(int c) {
     ++fLine;
 }
 
+void CsvReader::ThrowFieldTooLong(long fieldLine) const {
+    throw HostError(LocatedMessage(fFileName, fieldLine,
+                                   "a field is longer than " + std::to_string(kMaxFieldBytes) +
+                                       " bytes (is a quote left open?)"));
+}
+
 void CsvReader::Append(std::string& field, int c, long fieldLine) {
     if (field.size() >= kMaxFieldBytes) {
-        throw HostError(LocatedMessage(fFileName, fieldLine,
-                                       "a field is longer than " + std::to_string(kMaxFieldBytes) +
-                                           " bytes (is a quote left open?)"));
+        ThrowFieldTooLong(fieldLine);
     }
     field.push_back(static_cast<char>(c));
 }
 
+void CsvReader::AppendRun(std::string& field, bool quoted, long fieldLine) {
+    const char* const first = fvBuffer.data() + fPos;
+    const char* const last = fvBuffer.data() + fEnd;
+    const char* p = first;
+    // Most fields are short runs of ordinary bytes: find the run's end, then take it at once.
+    const char stop = quoted ? '"' : fDelimiter;
+    while (p != last && *p != stop && *p != '\n' && *p != '\r') {
+        ++p;
+    }
+    const std::size_t n = static_cast<std::size_t>(p - first);
+    if (n > kMaxFieldBytes - std::min(field.size(), kMaxFieldBytes)) {
+        ThrowFieldTooLong(fieldLine);
+    }
+    field.append(first, n);
+    fPos += n;
+}
+
 bool CsvReader::ReadRecord(std::vector<std::string>& fields) {
     enum class State { kFieldStart, kUnquoted, kQuoted, kQuoteInQuoted };
-    fields.clear();
-    std::string field;
+    // The record's fields go into the strings already in `fields`, which keep their capacity
+    // from one record to the next; `field` is the one being filled.
+    std::size_t nFields = 0;
+    std::string* field = nullptr;
+    const auto open = [&]() {
+        if (nFields == fields.size()) {
+            fields.emplace_back();
+        }
+        field = &fields[nFields++];
+        field->clear();
+    };
+    const auto finish = [&]() {
+        fields.resize(nFields);
+        return true;
+    };
     State state = State::kFieldStart;
     long fieldLine = fLine;
     bool anything = false; // a byte of this record has been read
     fRecordLine = fLine;
 
     for (;;) {
+        if (state == State::kUnquoted || state == State::kQuoted) {
+            AppendRun(*field, state == State::kQuoted, fieldLine);
+        }
         const int c = Next();
         if (c < 0) {
             if (state == State::kQuoted) {
@@ -81,10 +124,13 @@ bool CsvReader::ReadRecord(std::vector<std::string>& fields) {
                                                "of the file"));
             }
             if (!anything) {
+                fields.clear();
                 return false;
             }
-            fields.push_back(std::move(field));
-            return true;
+            if (state == State::kFieldStart) {
+                open();
+            }
+            return finish();
         }
         const bool lineEnd = (c == '\n' || c == '\r');
         switch (state) {
@@ -97,32 +143,29 @@ bool CsvReader::ReadRecord(std::vector<std::string>& fields) {
                 continue;
             }
             anything = true;
+            open();
             if (c == '"') {
                 fieldLine = fLine;
                 state = State::kQuoted;
             } else if (c == fDelimiter) {
-                fields.emplace_back();
+                // An empty field; the next one starts here.
             } else if (lineEnd) {
                 EndLine(c);
-                fields.push_back(std::move(field));
-                return true;
+                return finish();
             } else {
                 fieldLine = fLine;
-                Append(field, c, fieldLine);
+                Append(*field, c, fieldLine);
                 state = State::kUnquoted;
             }
             break;
         case State::kUnquoted:
             if (c == fDelimiter) {
-                fields.push_back(std::move(field));
-                field.clear();
                 state = State::kFieldStart;
             } else if (lineEnd) {
                 EndLine(c);
-                fields.push_back(std::move(field));
-                return true;
+                return finish();
             } else {
-                Append(field, c, fieldLine);
+                Append(*field, c, fieldLine);
             }
             break;
         case State::kQuoted:
@@ -130,7 +173,7 @@ bool CsvReader::ReadRecord(std::vector<std::string>& fields) {
                 state = State::kQuoteInQuoted;
             } else {
                 // A line end inside quotes belongs to the field, exactly as written.
-                Append(field, c, fieldLine);
+                Append(*field, c, fieldLine);
                 if (c == '\n' || (c == '\r' && Peek() != '\n')) {
                     ++fLine;
                 }
@@ -138,16 +181,13 @@ bool CsvReader::ReadRecord(std::vector<std::string>& fields) {
             break;
         case State::kQuoteInQuoted:
             if (c == '"') {
-                Append(field, c, fieldLine);
+                Append(*field, c, fieldLine);
                 state = State::kQuoted;
             } else if (c == fDelimiter) {
-                fields.push_back(std::move(field));
-                field.clear();
                 state = State::kFieldStart;
             } else if (lineEnd) {
                 EndLine(c);
-                fields.push_back(std::move(field));
-                return true;
+                return finish();
             } else {
                 throw HostError(LocatedMessage(fFileName, fLine,
                                                Describe(c) + " follows a closing quote; a "

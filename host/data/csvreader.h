@@ -21,37 +21,63 @@ class CsvReader {
 public:
     //! The longest field accepted, in bytes.
     static constexpr std::size_t kMaxFieldBytes = 1u << 20;
+    //! Bytes taken from the stream at a time.
+    static constexpr std::size_t kBufferBytes = 1u << 16;
 
     //! Reads from `in` (which must outlive the reader), naming `fileName` in messages. A
-    //! byte-order mark at the current position of `in` is skipped.
+    //! byte-order mark at the current position of `in` is skipped. The reader takes the stream
+    //! in blocks of kBufferBytes, so the stream's own position runs ahead of the records read.
     CsvReader(std::istream& in, std::string fileName, char delimiter = ',');
 
-    //! Reads the next record into `fields` (cleared first). False at the end of the input.
-    //! Throws HostError for a malformed record.
+    //! Reads the next record into `fields`, which then holds exactly the record's fields (the
+    //! strings already there are reused, so a loop over records allocates little). False, with
+    //! `fields` empty, at the end of the input. Throws HostError for a malformed record.
     bool ReadRecord(std::vector<std::string>& fields);
 
     //! The line on which the last record read began (from 1).
     long GetRecordLine() const { return fRecordLine; }
-    //! Bytes consumed from the stream since construction, the byte-order mark included.
-    std::uint64_t GetBytesRead() const { return fBytesRead; }
+    //! Bytes of the input that the records read so far took up, the byte-order mark included
+    //! (bytes read ahead into the buffer do not count).
+    std::uint64_t GetBytesRead() const { return fBytesFetched - (fEnd - fPos); }
     const std::string& GetFileName() const { return fFileName; }
 
 private:
+    //! Refills the buffer once it is used up; false at the end of the input.
+    bool Fill();
     //! The next byte as 0..255, or -1 at the end of the input.
-    int Next();
+    int Next() {
+        if (fPos == fEnd && !Fill()) {
+            return -1;
+        }
+        return static_cast<unsigned char>(fvBuffer[fPos++]);
+    }
     //! The next byte without consuming it, or -1.
-    int Peek();
+    int Peek() {
+        if (fPos == fEnd && !Fill()) {
+            return -1;
+        }
+        return static_cast<unsigned char>(fvBuffer[fPos]);
+    }
     //! Consumes the LF of a CRLF pair after `c` and counts the line end.
     void EndLine(int c);
     //! Appends `c` to `field`, refusing fields beyond kMaxFieldBytes.
     void Append(std::string& field, int c, long fieldLine);
+    //! Appends to `field` the bytes of the buffer up to the next one that ends the run (in
+    //! quotes a quote or a line end, otherwise the delimiter or a line end) or the buffer's
+    //! end, refusing fields beyond kMaxFieldBytes.
+    void AppendRun(std::string& field, bool quoted, long fieldLine);
+    //! Throws the message for a field beyond kMaxFieldBytes that began on `fieldLine`.
+    [[noreturn]] void ThrowFieldTooLong(long fieldLine) const;
 
-    std::streambuf* fpBuf;        //!< the stream's buffer, read byte by byte
-    std::string fFileName;        //!< named in messages
-    char fDelimiter;              //!< field separator
-    long fLine = 1;               //!< current line
-    long fRecordLine = 0;         //!< line where the last record began
-    std::uint64_t fBytesRead = 0; //!< bytes consumed
+    std::streambuf* fpBuf;           //!< the stream's buffer, read in blocks
+    std::string fFileName;           //!< named in messages
+    char fDelimiter;                 //!< field separator
+    std::vector<char> fvBuffer;      //!< the block being read
+    std::size_t fPos = 0;            //!< next unread byte of fvBuffer
+    std::size_t fEnd = 0;            //!< bytes of fvBuffer filled
+    long fLine = 1;                  //!< current line
+    long fRecordLine = 0;            //!< line where the last record began
+    std::uint64_t fBytesFetched = 0; //!< bytes taken from the stream, the byte-order mark included
 };
 
 } // namespace MCHost

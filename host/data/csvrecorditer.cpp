@@ -15,7 +15,12 @@ constexpr std::int64_t kProgressRows = 4096;
 } // namespace
 
 CsvRecordIter::CsvRecordIter(const DataDictionary& dictionary)
-    : fDictionary(dictionary), fRecord(dictionary.GetFields().size()) {}
+    : fDictionary(dictionary), fbCached(dictionary.HasCache()),
+      fRecord(dictionary.GetFields().size()) {
+    if (fbCached) {
+        fFileBytes = dictionary.GetFileBytes();
+    }
+}
 
 bool CsvRecordIter::Open() {
     fbOpened = true;
@@ -48,6 +53,15 @@ void CsvRecordIter::ReadAhead() {
     if (fbAhead || fbEnd || !fError.empty()) {
         return;
     }
+    if (fbCached) {
+        if (fNextRow < fDictionary.GetNRows()) {
+            fbAhead = true;
+        } else {
+            fbEnd = true;
+            Report();
+        }
+        return;
+    }
     if (!fbOpened && !Open()) {
         return;
     }
@@ -78,6 +92,10 @@ const MCXML_800::Record* CsvRecordIter::NextRecord() {
         return nullptr;
     }
     fbAhead = false;
+    if (fbCached) {
+        fDictionary.GetCachedRow(fNextRow++, fRecord);
+        return Counted();
+    }
     try {
         fDictionary.ConvertRow(fvCells, fRowLine, fRecord);
     } catch (const HostError& e) {
@@ -87,6 +105,10 @@ const MCXML_800::Record* CsvRecordIter::NextRecord() {
         fError = LocatedMessage(fDictionary.GetPath(), fRowLine, e.what());
         return nullptr;
     }
+    return Counted();
+}
+
+const MCXML_800::Record* CsvRecordIter::Counted() {
     ++fNRead;
     if (fNRead % kProgressRows == 0) {
         Report();
@@ -100,11 +122,26 @@ int CsvRecordIter::Restart() {
     fbAhead = false;
     fbEnd = false;
     fError.clear();
+    if (fbCached) {
+        fNextRow = 0;
+        return 0;
+    }
     return Open() ? 0 : -1;
 }
 
 void CsvRecordIter::Report() {
-    if (fProgress && fpReader) {
+    if (!fProgress) {
+        return;
+    }
+    if (fbCached) {
+        const std::int64_t nRows = fDictionary.GetNRows();
+        const std::uint64_t done =
+            fNextRow >= nRows ? fFileBytes
+                              : static_cast<std::uint64_t>(static_cast<double>(fFileBytes) *
+                                                           static_cast<double>(fNextRow) /
+                                                           static_cast<double>(nRows));
+        fProgress(fPass, done, fFileBytes);
+    } else if (fpReader) {
         fProgress(fPass, fpReader->GetBytesRead(), fFileBytes);
     }
 }

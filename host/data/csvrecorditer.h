@@ -1,8 +1,10 @@
-// The component's view of a CSV file: a MultiPassRecordIter that reads the file again for every
-// pass and turns each row into a Record through the file's DataDictionary.
+// The component's view of a CSV file: a MultiPassRecordIter over the rows of the file, each
+// turned into a Record through the file's DataDictionary.
 //
-// Re-reading keeps memory independent of the number of rows (one row and one record at a
-// time); each pass costs one read of the file, which the operating system's cache usually
+// When the dictionary kept the records' values while it read the file (HasCache), every pass
+// is served from memory and the file is not touched again. Otherwise the file is read again for
+// every pass, which keeps memory independent of the number of rows (one row and one record at a
+// time); each pass then costs one read of the file, which the operating system's cache usually
 // serves. Nothing here throws into the component: a row that cannot be read ends the pass
 // with HasMore true and NextRecord null, and GetError tells the host what happened.
 #pragma once
@@ -21,18 +23,19 @@ namespace MCHost {
 class CsvRecordIter : public MCCommon_800::MultiPassRecordIter {
 public:
     //! Progress of the current pass: the pass number (from 1), bytes read, the file's size.
+    //! A pass served from memory counts the rows handed out as that fraction of the file.
     using PassProgress =
         std::function<void(int pass, std::uint64_t bytesRead, std::uint64_t fileBytes)>;
 
     //! Iterates over the rows of `dictionary`'s file; the dictionary must outlive the
-    //! iterator. The file is opened at the first HasMore.
+    //! iterator. Without the dictionary's cache, the file is opened at the first HasMore.
     explicit CsvRecordIter(const DataDictionary& dictionary);
 
     bool HasMore() override;
     //! The next record, or null when the row could not be read (GetError says why).
     const MCXML_800::Record* NextRecord() override;
     //! Starts the next pass from the first data row: 0 on success, -1 when the file cannot be
-    //! opened again.
+    //! opened again (never when the pass is served from memory).
     int Restart() override;
 
     //! Called every few thousand rows and at the end of each pass.
@@ -48,10 +51,15 @@ private:
     //! Opens the file and skips the header; false (with fError) on failure.
     bool Open();
     //! Reads the next row into fvCells unless one is waiting; sets fbAhead, fbEnd or fError.
+    //! From the dictionary's cache: sets fbAhead or fbEnd.
     void ReadAhead();
+    //! Counts the record about to be handed out and reports progress now and then.
+    const MCXML_800::Record* Counted();
     void Report();
 
     const DataDictionary& fDictionary;   //!< the file and its fields
+    const bool fbCached;                 //!< passes are served from the dictionary's cache
+    std::int64_t fNextRow = 0;           //!< from the cache: the next row of this pass
     std::ifstream fIn;                   //!< the open file
     std::unique_ptr<CsvReader> fpReader; //!< reads fIn
     std::uint64_t fFileBytes = 0;        //!< the file's size, for progress

@@ -10,11 +10,17 @@
 #include <cerrno>
 #include <cmath>
 #include <cstring>
+#include <deque>
 #include <filesystem>
 #include <fstream>
+#include <new>
 #include <set>
-#include <unordered_set>
 #include <system_error>
+#include <unordered_set>
+
+#if defined(__GLIBC__)
+#include <malloc.h>
+#endif
 
 namespace MCHost {
 
@@ -35,7 +41,8 @@ std::string Lower(std::string s) {
     return s;
 }
 
-std::string Trim(const std::string& s) {
+//! `s` without its surrounding blanks (spaces and tabs).
+std::string_view TrimBlanks(std::string_view s) {
     std::size_t b = 0;
     std::size_t e = s.size();
     while (b < e && (s[b] == ' ' || s[b] == '\t')) {
@@ -45,6 +52,10 @@ std::string Trim(const std::string& s) {
         --e;
     }
     return s.substr(b, e - b);
+}
+
+std::string Trim(const std::string& s) {
+    return std::string(TrimBlanks(s));
 }
 
 std::string JoinNames(const std::vector<std::string>& names) {
@@ -59,20 +70,222 @@ bool IsWhole(double x) {
     return std::fabs(x) <= kMaxExactWhole && x == std::floor(x);
 }
 
-//! What the first reading learns about one used column.
-struct FieldScan {
-    std::int64_t fNMissing = 0;     //!< missing cells
-    bool fbText = false;            //!< some cell is text
-    bool fbAllWhole = true;         //!< every number is whole
-    // Hash sets: every cell of a field with few distinct values is looked up once (an ordered
-    // set's string comparisons were a fifth of a whole fit); the categories are sorted after.
-    std::unordered_set<double> fNumbers;    //!< distinct numbers, up to the cap
-    bool fbNumbersOverflow = false;         //!< more distinct numbers than the cap
-    std::unordered_set<std::string> fTexts; //!< distinct cell texts, up to the cap
-    bool fbTextsOverflow = false;   //!< more distinct texts than the cap
-    long fFirstTextLine = 0;        //!< line of the first text cell
-    std::string fFirstText;         //!< that cell
+//! What one cell of a used column reads as.
+struct CellRead {
+    CellKind fKind = CellKind::kMissing; //!< missing, number or text
+    double fNumber = 0.0;                //!< the number, for a number
+    //! Index of the cell's text among the column's distinct texts (FieldScan::fTexts), or -1
+    //! for a missing cell and once the column keeps its texts no longer.
+    std::int32_t fTextId = -1;
 };
+
+//! What the first reading learns about one used column.
+class FieldScan {
+public:
+    //! Reads one cell of the column, found on `line`; `cap` is the most distinct values kept.
+    CellRead Add(std::string_view cell, long line, std::size_t cap);
+
+    std::int64_t fNMissing = 0; //!< missing cells
+    bool fbText = false;        //!< some cell is text
+    bool fbAllWhole = true;     //!< every number is whole
+    // A hash set: every cell of a field with few distinct values is looked up once (an ordered
+    // set's comparisons were a fifth of a whole fit); the categories are sorted after.
+    std::unordered_set<double> fNumbers; //!< distinct numbers, up to the cap
+    bool fbNumbersOverflow = false;      //!< more distinct numbers than the cap
+    //! Distinct cell texts (without blanks, missing cells left out), up to the cap, in the order
+    //! first seen. A deque: the views in fTextIds stay valid as it grows.
+    std::deque<std::string> fTexts;
+    std::unordered_map<std::string_view, std::int32_t> fTextIds; //!< index of each in fTexts
+    std::vector<char> fvTextIsNumber;                            //!< per text: it reads as a number
+    std::vector<double> fvTextNumber; //!< per text: that number (0 for text)
+    bool fbTextsOverflow = false;     //!< more distinct texts than the cap
+    long fFirstTextLine = 0;          //!< line of the first text cell
+    std::string fFirstText;           //!< that cell
+};
+
+CellRead FieldScan::Add(std::string_view cell, long line, std::size_t cap) {
+    CellRead read;
+    const std::string_view trimmed = TrimBlanks(cell);
+    // A text seen before reads as it did then: one lookup instead of a parse, and what it
+    // taught the scan (kind, number, wholeness) is known already.
+    if (!fbTextsOverflow) {
+        const auto it = fTextIds.find(trimmed);
+        if (it != fTextIds.end()) {
+            const auto id = static_cast<std::size_t>(it->second);
+            read.fKind = fvTextIsNumber[id] ? CellKind::kNumber : CellKind::kText;
+            read.fNumber = fvTextNumber[id];
+            read.fTextId = it->second;
+            return read;
+        }
+    }
+    std::string_view text;
+    read.fKind = ClassifyCell(trimmed, text, read.fNumber);
+    if (read.fKind == CellKind::kMissing) {
+        ++fNMissing;
+        return read;
+    }
+    if (read.fKind == CellKind::kText && !fbText) {
+        fbText = true;
+        fFirstTextLine = line;
+        fFirstText = std::string(text);
+    }
+    if (read.fKind == CellKind::kNumber) {
+        fbAllWhole = fbAllWhole && IsWhole(read.fNumber);
+        if (!fbNumbersOverflow && fNumbers.insert(read.fNumber).second && fNumbers.size() >= cap) {
+            fbNumbersOverflow = true;
+        }
+    }
+    // Numbers are kept as texts too: should the column turn out to hold text, they are
+    // categories by their text.
+    if (!fbTextsOverflow) {
+        read.fTextId = static_cast<std::int32_t>(fTexts.size());
+        fTexts.emplace_back(text);
+        fTextIds.emplace(fTexts.back(), read.fTextId);
+        fvTextIsNumber.push_back(read.fKind == CellKind::kNumber ? 1 : 0);
+        fvTextNumber.push_back(read.fKind == CellKind::kNumber ? read.fNumber : 0.0);
+        if (fTexts.size() >= cap) {
+            fbTextsOverflow = true;
+        }
+    }
+    return read;
+}
+
+// ------------------------------------------------------------------------------------------
+// The values kept for the passes
+
+//! Bytes that the kept values may take, and how many they take.
+class CacheBudget {
+public:
+    explicit CacheBudget(std::uint64_t limit) : fLimit(limit) {}
+    //! Counts `bytes` more; false (counting nothing) when they do not fit.
+    bool Take(std::uint64_t bytes) {
+        if (bytes > fLimit - fUsed) {
+            return false;
+        }
+        fUsed += bytes;
+        return true;
+    }
+    void Give(std::uint64_t bytes) { fUsed -= std::min(bytes, fUsed); }
+
+private:
+    std::uint64_t fLimit;    //!< most bytes
+    std::uint64_t fUsed = 0; //!< bytes counted
+};
+
+//! A column of values that grows by chunks, so that growing never copies what is there and
+//! the memory it holds is never more than a chunk beyond its size (a vector doubling its
+//! capacity would hold, for a moment, three times the data).
+template <class T> class Chunks {
+public:
+    static constexpr int kChunkShift = 16;
+    static constexpr std::size_t kChunkSize = std::size_t{1} << kChunkShift;
+
+    //! Appends `x`; false, with nothing appended, when the memory for it is not in `budget`
+    //! or not to be had.
+    bool Push(T x, CacheBudget& budget) {
+        if (fvChunks.empty() || fvChunks.back().size() == kChunkSize) {
+            fvChunks.emplace_back();
+        }
+        std::vector<T>& chunk = fvChunks.back();
+        if (chunk.size() == chunk.capacity()) {
+            // The first chunk grows from small (a file of few rows keeps little), the others
+            // are whole at once. Old and new storage are both held while the chunk moves.
+            const std::size_t old = chunk.capacity();
+            const std::size_t grown = fvChunks.size() == 1
+                                          ? std::min(kChunkSize, std::max<std::size_t>(64, 2 * old))
+                                          : kChunkSize;
+            if (!budget.Take(grown * sizeof(T))) {
+                return false;
+            }
+            try {
+                chunk.reserve(grown);
+            } catch (const std::bad_alloc&) {
+                budget.Give(grown * sizeof(T));
+                return false;
+            }
+            budget.Give(old * sizeof(T));
+        }
+        chunk.push_back(x);
+        ++fSize;
+        return true;
+    }
+    T operator[](std::int64_t i) const {
+        const auto u = static_cast<std::uint64_t>(i);
+        return fvChunks[u >> kChunkShift][u & (kChunkSize - 1)];
+    }
+    T& operator[](std::int64_t i) {
+        const auto u = static_cast<std::uint64_t>(i);
+        return fvChunks[u >> kChunkShift][u & (kChunkSize - 1)];
+    }
+    std::int64_t Size() const { return fSize; }
+    //! Frees every chunk and gives its memory back to `budget`.
+    void Release(CacheBudget& budget) {
+        for (const std::vector<T>& chunk : fvChunks) {
+            budget.Give(chunk.capacity() * sizeof(T));
+        }
+        std::vector<std::vector<T>>().swap(fvChunks);
+        fSize = 0;
+    }
+
+private:
+    std::vector<std::vector<T>> fvChunks; //!< full chunks, then the one being filled
+    std::int64_t fSize = 0;               //!< values held
+};
+
+//! What the records carry for one field, row by row. While the field has few distinct texts a
+//! row holds a small index into them (0 for a missing cell, 1 + the text's index in
+//! FieldScan::fTexts otherwise), which the end of the reading turns into values (codes or
+//! numbers) through fvIdValues, since a field's level and codes are known only then; past the
+//! cap of distinct texts a row holds the number itself.
+struct FieldColumn {
+    bool fbById = true;             //!< rows are held in fIds, not fValues
+    Chunks<std::uint32_t> fIds;     //!< per row, the index of its text (0 missing)
+    Chunks<double> fValues;         //!< per row, the value
+    std::vector<double> fvIdValues; //!< the value of each index of fIds, once known
+
+    //! Keeps the cell `read` of `scan`'s column; false when the budget is spent.
+    bool Add(const CellRead& read, const FieldScan& scan, CacheBudget& budget);
+    //! Turns the indices held so far into numbers, as the column has stopped keeping texts.
+    bool ToValues(const FieldScan& scan, CacheBudget& budget);
+};
+
+bool FieldColumn::Add(const CellRead& read, const FieldScan& scan, CacheBudget& budget) {
+    if (fbById && scan.fbTextsOverflow && !ToValues(scan, budget)) {
+        return false;
+    }
+    if (fbById) {
+        return fIds.Push(
+            read.fKind == CellKind::kMissing ? 0u : static_cast<std::uint32_t>(read.fTextId) + 1u,
+            budget);
+    }
+    // A text cell past the cap of distinct texts makes the reading fail at its end (a text
+    // field with too many categories): what is kept for it does not matter.
+    return fValues.Push(read.fKind == CellKind::kNumber ? read.fNumber : MCMV::Missing(), budget);
+}
+
+bool FieldColumn::ToValues(const FieldScan& scan, CacheBudget& budget) {
+    for (std::int64_t r = 0; r < fIds.Size(); ++r) {
+        const std::uint32_t id = fIds[r];
+        const bool number = id > 0 && scan.fvTextIsNumber[id - 1] != 0;
+        if (!fValues.Push(number ? scan.fvTextNumber[id - 1] : MCMV::Missing(), budget)) {
+            return false;
+        }
+    }
+    fIds.Release(budget);
+    fbById = false;
+    return true;
+}
+
+//! Frees the values kept so far when they outgrow their budget.
+void DropColumns(std::vector<FieldColumn>& columns) {
+    std::vector<FieldColumn>().swap(columns);
+#if defined(__GLIBC__)
+    // The allocator keeps freed blocks of its heap for later use, and the chunks it placed
+    // there (once its threshold for mapping blocks of their own has risen) would then add to
+    // the peak memory of a large fit. Give them back to the system at once.
+    malloc_trim(0);
+#endif
+}
 
 //! Opens `path` for reading or throws a message naming it.
 void OpenData(const std::string& path, std::ifstream& in) {
@@ -143,8 +356,8 @@ std::string MeasureLevelName(MeasureLevel level) {
     }
 }
 
-CellKind ClassifyCell(const std::string& cell, std::string& text, double& number) {
-    text = Trim(cell);
+CellKind ClassifyCell(std::string_view cell, std::string_view& text, double& number) {
+    text = TrimBlanks(cell);
     const std::size_t n = text.size();
     if (n == 0 || (n == 2 && text[0] == 'N' && text[1] == 'A') || (n == 1 && text[0] == '.')) {
         return CellKind::kMissing;
@@ -153,6 +366,85 @@ CellKind ClassifyCell(const std::string& cell, std::string& text, double& number
         return std::isfinite(number) ? CellKind::kNumber : CellKind::kMissing;
     }
     return CellKind::kText;
+}
+
+//! The kept values of every used field, in the form the records carry them.
+class DataDictionary::RowCache {
+public:
+    //! Completes the values kept of `dict`'s fields while its file was read (`scans` and
+    //! `columns`: one per used field) once the levels and codes are known; null when they do
+    //! not fit in `budget`.
+    static std::shared_ptr<const RowCache> Make(const DataDictionary& dict,
+                                                const std::vector<const FieldScan*>& scans,
+                                                std::vector<FieldColumn> columns,
+                                                CacheBudget& budget);
+
+    //! Fills `record` (sized) with the values of `row`.
+    void Fill(std::int64_t row, MCXML_800::Record& record) const {
+        for (std::size_t i = 0; i < fvColumns.size(); ++i) {
+            const FieldColumn& column = fvColumns[i];
+            record[i] = column.fbById ? column.fvIdValues[column.fIds[row]] : column.fValues[row];
+        }
+    }
+
+private:
+    explicit RowCache(std::vector<FieldColumn> columns) : fvColumns(std::move(columns)) {}
+
+    std::vector<FieldColumn> fvColumns; //!< one per used field
+};
+
+std::shared_ptr<const DataDictionary::RowCache>
+DataDictionary::RowCache::Make(const DataDictionary& dict,
+                               const std::vector<const FieldScan*>& scans,
+                               std::vector<FieldColumn> columns, CacheBudget& budget) {
+    // The level and codes of each field are known now: the values of a field held by text
+    // index come from its distinct texts, those held as numbers become codes when the field
+    // is categorical, exactly as ConvertRow turns a cell into a value.
+    for (std::size_t i = 0; i < dict.fvFields.size(); ++i) {
+        const DataField& f = dict.fvFields[i];
+        const FieldScan& scan = *scans[i];
+        FieldColumn& column = columns[i];
+        const bool categorical = f.fLevel == MCSPConst::kLevelCategorical;
+        const auto& textCodes = dict.fvTextCodes[i];
+        const auto& numberCodes = dict.fvNumberCodes[i];
+        if (column.fbById) {
+            const std::size_t n = scan.fTexts.size();
+            if (!budget.Take((n + 1) * sizeof(double))) {
+                return nullptr;
+            }
+            column.fvIdValues.assign(n + 1, MCMV::Missing());
+            for (std::size_t id = 0; id < n; ++id) {
+                double value = scan.fvTextNumber[id];
+                if (categorical && f.fbText) {
+                    const auto it = textCodes.find(scan.fTexts[id]);
+                    if (it == textCodes.end()) {
+                        return nullptr;
+                    }
+                    value = static_cast<double>(it->second);
+                } else if (categorical) {
+                    const auto it = numberCodes.find(value);
+                    if (it == numberCodes.end()) {
+                        return nullptr;
+                    }
+                    value = static_cast<double>(it->second);
+                }
+                column.fvIdValues[id + 1] = value;
+            }
+        } else if (categorical) {
+            for (std::int64_t r = 0; r < column.fValues.Size(); ++r) {
+                double& value = column.fValues[r];
+                if (MCMV::IsMissing(value)) {
+                    continue;
+                }
+                const auto it = numberCodes.find(value);
+                if (it == numberCodes.end()) {
+                    return nullptr;
+                }
+                value = static_cast<double>(it->second);
+            }
+        }
+    }
+    return std::shared_ptr<const RowCache>(new RowCache(std::move(columns)));
 }
 
 DataDictionary DataDictionary::Build(const std::string& path, const DataOptions& options,
@@ -206,13 +498,20 @@ DataDictionary DataDictionary::Build(const std::string& path, const DataOptions&
         checkName(entry.first, "in a level setting");
     }
 
-    // One reading of the rows: kinds, distinct values, missing counts.
+    // One reading of the rows: kinds, distinct values, missing counts, and, while they fit in
+    // the budget, what the records will carry (`columns`, one per used field).
     const std::size_t cap =
         static_cast<std::size_t>(std::max(options.fMaxCategories, options.fMaxOrdinalValues) + 1);
     std::vector<FieldScan> scans(header.size());
+    std::vector<std::size_t> fieldOf(header.size(), 0); // index among the used columns
+    std::size_t nUsed = 0;
+    for (std::size_t c = 0; c < header.size(); ++c) {
+        fieldOf[c] = used[c] ? nUsed++ : 0;
+    }
+    bool caching = options.fMaxCacheBytes > 0;
+    CacheBudget budget(options.fMaxCacheBytes);
+    std::vector<FieldColumn> columns(caching ? nUsed : 0);
     std::vector<std::string> cells;
-    std::string text;
-    double number = 0.0;
     while (reader.ReadRecord(cells)) {
         if (cells.size() != header.size()) {
             throw HostError(LocatedMessage(path, reader.GetRecordLine(),
@@ -226,26 +525,11 @@ DataDictionary DataDictionary::Build(const std::string& path, const DataOptions&
                 continue;
             }
             FieldScan& scan = scans[c];
-            const CellKind kind = ClassifyCell(cells[c], text, number);
-            if (kind == CellKind::kMissing) {
-                ++scan.fNMissing;
-                continue;
-            }
-            if (kind == CellKind::kText && !scan.fbText) {
-                scan.fbText = true;
-                scan.fFirstTextLine = reader.GetRecordLine();
-                scan.fFirstText = text;
-            }
-            if (kind == CellKind::kNumber) {
-                scan.fbAllWhole = scan.fbAllWhole && IsWhole(number);
-                if (!scan.fbNumbersOverflow && scan.fNumbers.insert(number).second &&
-                    scan.fNumbers.size() >= cap) {
-                    scan.fbNumbersOverflow = true;
-                }
-            }
-            if (!scan.fbTextsOverflow && scan.fTexts.insert(text).second &&
-                scan.fTexts.size() >= cap) {
-                scan.fbTextsOverflow = true;
+            const CellRead read = scan.Add(cells[c], reader.GetRecordLine(), cap);
+            if (caching && !columns[fieldOf[c]].Add(read, scan, budget)) {
+                // Over the budget: the passes will read the file again.
+                caching = false;
+                DropColumns(columns);
             }
         }
         if (progress && dict.fNRows % kProgressRows == 0) {
@@ -288,8 +572,25 @@ DataDictionary DataDictionary::Build(const std::string& path, const DataOptions&
         }
         dict.fvFields.push_back(std::move(field));
     }
+    dict.fFileBytes = reader.GetBytesRead();
     dict.Finish();
+    if (caching) {
+        std::vector<const FieldScan*> usedScans;
+        for (std::size_t c = 0; c < header.size(); ++c) {
+            if (used[c]) {
+                usedScans.push_back(&scans[c]);
+            }
+        }
+        dict.fpCache = RowCache::Make(dict, usedScans, std::move(columns), budget);
+    }
     return dict;
+}
+
+void DataDictionary::GetCachedRow(std::int64_t row, MCXML_800::Record& record) const {
+    if (record.Size() != fvFields.size()) {
+        record = MCXML_800::Record(fvFields.size());
+    }
+    fpCache->Fill(row, record);
 }
 
 void DataDictionary::Finish() {
@@ -347,7 +648,7 @@ void DataDictionary::ConvertRow(const std::vector<std::string>& cells, long line
     if (record.Size() != fvFields.size()) {
         record = MCXML_800::Record(fvFields.size());
     }
-    std::string text;
+    std::string_view text;
     double number = 0.0;
     for (std::size_t i = 0; i < fvFields.size(); ++i) {
         const DataField& f = fvFields[i];
@@ -361,7 +662,7 @@ void DataDictionary::ConvertRow(const std::vector<std::string>& cells, long line
         if (f.fLevel == MCSPConst::kLevelCategorical) {
             int code = -1;
             if (f.fbText) {
-                const auto it = fvTextCodes[i].find(text);
+                const auto it = fvTextCodes[i].find(std::string(text));
                 code = it == fvTextCodes[i].end() ? -1 : it->second;
             } else if (kind == CellKind::kNumber) {
                 const auto it = fvNumberCodes[i].find(number);
@@ -369,7 +670,8 @@ void DataDictionary::ConvertRow(const std::vector<std::string>& cells, long line
             }
             if (code < 0) {
                 throw HostError(LocatedMessage(fPath, line,
-                                               "field '" + f.fName + "' holds '" + text +
+                                               "field '" + f.fName + "' holds '" +
+                                                   std::string(text) +
                                                    "', which was not in the file when it was "
                                                    "first read (did the file change?)"));
             }
@@ -378,7 +680,7 @@ void DataDictionary::ConvertRow(const std::vector<std::string>& cells, long line
             value = number;
         } else {
             throw HostError(LocatedMessage(fPath, line,
-                                           "field '" + f.fName + "' holds '" + text +
+                                           "field '" + f.fName + "' holds '" + std::string(text) +
                                                "', which is not a number (did the file "
                                                "change?)"));
         }

@@ -19,6 +19,11 @@
 //                 categories, nominal kind; the record holds the category's code 0..k-1 as a
 //                 double, which is how the fitting counts a factor. The encoder turns codes
 //                 back into the category texts.
+//
+// While Build reads the rows it also keeps what every record will carry, as long as that fits in
+// DataOptions::fMaxCacheBytes; the record iterator then serves all the fitting's passes from
+// memory instead of reading the file again. A file too large for the budget is read again for
+// every pass, in memory independent of its number of rows.
 #pragma once
 
 #include "mccommon/records.h"
@@ -28,7 +33,9 @@
 #include <cstdint>
 #include <functional>
 #include <map>
+#include <memory>
 #include <string>
+#include <string_view>
 #include <unordered_map>
 #include <vector>
 
@@ -52,6 +59,9 @@ struct DataOptions {
     int fMaxOrdinalValues = 20;
     //! Most categories a categorical or ordinal field may have.
     int fMaxCategories = 1000;
+    //! Most bytes kept of the records' values for the passes over the data (0: none; the file
+    //! is then read again for every pass).
+    std::uint64_t fMaxCacheBytes = std::uint64_t{256} << 20;
 };
 
 //! Progress of one reading pass over a file: bytes read and the file's size.
@@ -88,14 +98,25 @@ public:
     int FindField(const std::string& name) const;
     //! The variables the component sees, one per used field.
     const MCXML_800::MCVarList& GetVarList() const { return fVarList; }
+    //! Bytes of the file read when the dictionary was built.
+    std::uint64_t GetFileBytes() const { return fFileBytes; }
 
     //! Fills `record` (one value per used field) from the cells of a data row. Throws
     //! HostError naming the line when the row does not match the dictionary (wrong number of
     //! cells, or a value not seen when the dictionary was built: the file changed).
     void ConvertRow(const std::vector<std::string>& cells, long line,
                     MCXML_800::Record& record) const;
+    //! Fills `record` with the values of data row `row` (from 0, below GetNRows) as ConvertRow
+    //! gave them from the file. Only when HasCache.
+    void GetCachedRow(std::int64_t row, MCXML_800::Record& record) const;
+
+    //! True when the records' values were kept while the file was read (they fitted in
+    //! DataOptions::fMaxCacheBytes), so the passes need not read the file again.
+    bool HasCache() const { return fpCache != nullptr; }
 
 private:
+    class RowCache;
+
     DataDictionary() = default;
     //! Builds the variable list and the lookup tables from the fields.
     void Finish();
@@ -104,17 +125,21 @@ private:
     char fDelimiter = ',';           //!< its separator
     int fNColumns = 0;               //!< header columns
     std::int64_t fNRows = 0;         //!< data rows
+    std::uint64_t fFileBytes = 0;    //!< bytes read by Build
     std::vector<DataField> fvFields; //!< used fields in file order
     MCXML_800::MCVarList fVarList;   //!< one variable per field
     //! Per field, the code of each text category (categorical text fields).
     std::vector<std::unordered_map<std::string, int>> fvTextCodes;
     //! Per field, the code of each numeric category (categorical numeric fields).
     std::vector<std::map<double, int>> fvNumberCodes;
+    //! The records' values kept by Build; shared by copies, never changed after Build. Null
+    //! when they did not fit in the budget.
+    std::shared_ptr<const RowCache> fpCache;
 };
 
 //! How a cell reads: missing, a number, or text. `text` receives the cell without its
-//! surrounding blanks and `number` the value of a number.
+//! surrounding blanks (a view into `cell`) and `number` the value of a number.
 enum class CellKind { kMissing, kNumber, kText };
-CellKind ClassifyCell(const std::string& cell, std::string& text, double& number);
+CellKind ClassifyCell(std::string_view cell, std::string_view& text, double& number);
 
 } // namespace MCHost

@@ -24,6 +24,7 @@
 #include <cstdint>
 #include <cstdio>
 #include <cstdlib>
+#include <cstring>
 #include <filesystem>
 #include <fstream>
 #include <string>
@@ -178,6 +179,35 @@ void Fit(const DataDictionary& dict) {
     CheckNumbers(results->GetCrstabsProbs());
 }
 
+//! The values of every record of one pass, as bits (missing values compare equal).
+std::vector<std::uint64_t> PassBits(const DataDictionary& dict) {
+    std::vector<std::uint64_t> bits;
+    MCHost::CsvRecordIter iter(dict);
+    while (iter.HasMore()) {
+        const MCXML_800::Record* record = iter.NextRecord();
+        if (record == nullptr) {
+            break;
+        }
+        for (double v : record->GetAll()) {
+            std::uint64_t b = 0;
+            std::memcpy(&b, &v, sizeof b);
+            bits.push_back(b);
+        }
+    }
+    return bits;
+}
+
+//! The passes served from memory must be the passes read from the file.
+void CompareWithRereading(const std::string& path, const MCHost::DataOptions& options,
+                          const DataDictionary& cached) {
+    MCHost::DataOptions rereading = options;
+    rereading.fMaxCacheBytes = 0;
+    const DataDictionary dict = DataDictionary::Build(path, rereading);
+    if (dict.HasCache() || PassBits(dict) != PassBits(cached)) {
+        Broken("the data kept in memory differ from the file read again");
+    }
+}
+
 void ReadFile(const std::string& path, const MCHost::DataOptions& options) {
     try {
         const DataDictionary dict = DataDictionary::Build(path, options);
@@ -195,6 +225,9 @@ void ReadFile(const std::string& path, const MCHost::DataOptions& options) {
         }
         if (first >= 0 && first != dict.GetNRows()) {
             Broken("a pass hands out a number of records other than the rows counted");
+        }
+        if (dict.HasCache()) {
+            CompareWithRereading(path, options, dict);
         }
         // Small files that read are fitted too: bad data for the fitting.
         if (first > 0 && first <= kMaxFitRows && !dict.GetFields().empty() &&

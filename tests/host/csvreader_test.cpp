@@ -1,10 +1,13 @@
 // The CSV record layer on awkward files: quoting, embedded line ends, line-end styles,
-// byte-order marks, blank lines, and the malformed records it must refuse with file and line.
+// byte-order marks, blank lines, and the malformed records it must refuse with file and line;
+// and files written from known records, long enough that every kind of token falls across the
+// reader's block boundaries, read back exactly.
 #include "common/hosterror.h"
 #include "data/csvreader.h"
 
 #include <gtest/gtest.h>
 
+#include <random>
 #include <sstream>
 #include <string>
 #include <vector>
@@ -127,6 +130,189 @@ TEST(CsvReader, RefusesARunawayField) {
     } catch (const HostError& e) {
         EXPECT_EQ(std::string(e.what()).rfind("big.csv:2:", 0), 0u) << e.what();
     }
+}
+
+// ------------------------------------------------------------------------------------------
+// The field limit, to the byte, for both kinds of field.
+
+struct LimitCase {
+    const char* name;
+    bool quoted;
+    std::size_t length; //!< the field's length
+    bool accepted;
+};
+
+class CsvReaderFieldLimit : public ::testing::TestWithParam<LimitCase> {};
+
+TEST_P(CsvReaderFieldLimit, AcceptsUpToTheLimitAndNoMore) {
+    const LimitCase& c = GetParam();
+    const std::string field(c.length, 'x');
+    const std::string text = "a,b\n1," + (c.quoted ? "\"" + field + "\"" : field) + "\n";
+    std::istringstream in(text);
+    CsvReader reader(in, "big.csv");
+    std::vector<std::string> fields;
+    ASSERT_TRUE(reader.ReadRecord(fields));
+    try {
+        ASSERT_TRUE(reader.ReadRecord(fields));
+        EXPECT_TRUE(c.accepted);
+        ASSERT_EQ(fields.size(), 2u);
+        EXPECT_EQ(fields[1].size(), c.length);
+    } catch (const HostError& e) {
+        EXPECT_FALSE(c.accepted);
+        EXPECT_EQ(std::string(e.what()).rfind("big.csv:2:", 0), 0u) << e.what();
+    }
+}
+
+INSTANTIATE_TEST_SUITE_P(
+    Lengths, CsvReaderFieldLimit,
+    ::testing::Values(LimitCase{"UnquotedAtTheLimit", false, CsvReader::kMaxFieldBytes, true},
+                      LimitCase{"UnquotedOneOver", false, CsvReader::kMaxFieldBytes + 1, false},
+                      LimitCase{"QuotedAtTheLimit", true, CsvReader::kMaxFieldBytes, true},
+                      LimitCase{"QuotedOneOver", true, CsvReader::kMaxFieldBytes + 1, false}),
+    [](const auto& p) { return std::string(p.param.name); });
+
+// ------------------------------------------------------------------------------------------
+// Written from known records and read back.
+
+//! A file written from random records (fixed seed): the text and what reading it must give.
+struct WrittenFile {
+    std::string text;
+    Rows rows;
+    std::vector<long> lines;
+};
+
+//! Line ends in `s` as the reader counts them: LF, CRLF and a lone CR, one line each.
+long CountLineEnds(const std::string& s) {
+    long n = 0;
+    for (std::size_t i = 0; i < s.size(); ++i) {
+        n += s[i] == '\n' || (s[i] == '\r' && (i + 1 == s.size() || s[i + 1] != '\n'));
+    }
+    return n;
+}
+
+WrittenFile WriteRandomFile(unsigned seed, char delimiter, std::size_t minBytes) {
+    std::mt19937 gen(seed);
+    const auto pick = [&](int n) { return static_cast<int>(gen() % static_cast<unsigned>(n)); };
+    static const char kPlain[] = "abcXYZ019 .-+";
+    const std::string lineEnds[] = {"\n", "\r\n", "\r"};
+    WrittenFile file;
+    long line = 1;
+    while (file.text.size() < minBytes) {
+        const int nFields = 1 + pick(6);
+        std::vector<std::string> record;
+        std::string written;
+        for (int k = 0; k < nFields; ++k) {
+            // Mostly short fields; now and then one longer than the reader's block.
+            const std::size_t length =
+                pick(1000) == 0 ? CsvReader::kBufferBytes + static_cast<std::size_t>(pick(999))
+                                : static_cast<std::size_t>(pick(12));
+            const bool quoted = pick(3) == 0 || (nFields == 1 && length == 0);
+            std::string value;
+            for (std::size_t i = 0; i < length; ++i) {
+                if (quoted && pick(8) == 0) {
+                    const std::string tricky[] = {"\"", "\n", "\r\n", "\r",
+                                                  std::string(1, delimiter)};
+                    value += tricky[pick(5)];
+                } else {
+                    value += kPlain[pick(static_cast<int>(sizeof kPlain) - 1)];
+                }
+            }
+            std::string cell = value;
+            if (quoted) {
+                cell.clear();
+                for (char ch : value) {
+                    cell += ch == '"' ? std::string("\"\"") : std::string(1, ch);
+                }
+                cell = "\"" + cell + "\"";
+            }
+            written += (k > 0 ? std::string(1, delimiter) : std::string()) + cell;
+            record.push_back(value);
+        }
+        file.rows.push_back(record);
+        file.lines.push_back(line);
+        line += CountLineEnds(written);
+        // The line end, sometimes followed by blank lines of the same kind.
+        const std::string& end = lineEnds[pick(3)];
+        const int blanks = pick(10) == 0 ? 1 + pick(2) : 0;
+        for (int b = 0; b <= blanks; ++b) {
+            written += end;
+            ++line;
+        }
+        file.text += written;
+    }
+    return file;
+}
+
+TEST(CsvReader, ReadsBackRecordsWrittenAcrossBlockBoundaries) {
+    for (const char delimiter : {',', ';', '\t'}) {
+        for (unsigned seed = 1; seed <= 3; ++seed) {
+            const WrittenFile file = WriteRandomFile(seed, delimiter, 5 * CsvReader::kBufferBytes);
+            std::istringstream in(file.text);
+            CsvReader reader(in, "w.csv", delimiter);
+            // One vector for all records: the strings left from a longer record are reused.
+            std::vector<std::string> fields;
+            Rows rows;
+            std::vector<long> lines;
+            while (reader.ReadRecord(fields)) {
+                rows.push_back(fields);
+                lines.push_back(reader.GetRecordLine());
+            }
+            EXPECT_TRUE(fields.empty());
+            ASSERT_EQ(rows.size(), file.rows.size()) << "seed " << seed;
+            for (std::size_t r = 0; r < rows.size(); ++r) {
+                ASSERT_EQ(rows[r], file.rows[r]) << "seed " << seed << ", record " << r;
+            }
+            EXPECT_EQ(lines, file.lines) << "seed " << seed;
+            EXPECT_EQ(reader.GetBytesRead(), file.text.size());
+        }
+    }
+}
+
+TEST(CsvReader, ReadsEveryTokenSplitByTheBlockBoundary) {
+    // Records full of two-byte tokens (CRLF, a doubled quote, a closing quote before a
+    // delimiter, an empty field, CR before a blank line), placed so that the boundary of the
+    // reader's first block falls before each byte of them in turn.
+    const std::string tail = "\"q\"\"r\",s\r\n\"t\r\nu\",,v\r\nw\r\r\n\"\",z";
+    for (std::size_t at = 0; at <= tail.size(); ++at) {
+        const std::size_t padding = CsvReader::kBufferBytes - at - 9;
+        const std::string text = "h1,h2\nx," + std::string(padding, 'y') + "\n" + tail;
+        ASSERT_EQ(text.find(tail), CsvReader::kBufferBytes - at);
+        std::istringstream in(text);
+        CsvReader reader(in, "t.csv");
+        std::vector<std::string> fields;
+        Rows rows;
+        std::vector<long> lines;
+        while (reader.ReadRecord(fields)) {
+            rows.push_back(fields);
+            lines.push_back(reader.GetRecordLine());
+        }
+        const Rows expected = {{"h1", "h2"},  {"x", std::string(padding, 'y')},
+                               {"q\"r", "s"}, {"t\r\nu", "", "v"},
+                               {"w"},         {"", "z"}};
+        EXPECT_EQ(rows, expected) << "boundary before byte " << at;
+        EXPECT_EQ(lines, (std::vector<long>{1, 2, 3, 4, 6, 8})) << "boundary before byte " << at;
+        EXPECT_EQ(reader.GetBytesRead(), text.size());
+    }
+}
+
+TEST(CsvReader, BytesReadCountRecordsNotTheBlockReadAhead) {
+    std::string text = "\xEF\xBB\xBFh\n";
+    for (int i = 0; i < 50000; ++i) {
+        text += std::to_string(i) + "\r\n";
+    }
+    std::istringstream in(text);
+    CsvReader reader(in, "b.csv");
+    std::vector<std::string> fields;
+    std::uint64_t expected = 5; // the mark and the header
+    ASSERT_TRUE(reader.ReadRecord(fields));
+    EXPECT_EQ(reader.GetBytesRead(), expected);
+    for (int i = 0; i < 50000; ++i) {
+        ASSERT_TRUE(reader.ReadRecord(fields));
+        expected += std::to_string(i).size() + 2;
+        ASSERT_EQ(reader.GetBytesRead(), expected) << "record " << i;
+    }
+    EXPECT_FALSE(reader.ReadRecord(fields));
+    EXPECT_EQ(reader.GetBytesRead(), text.size());
 }
 
 } // namespace

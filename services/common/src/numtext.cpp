@@ -35,20 +35,24 @@ std::string FormatRoundTrip(double x) {
 }
 
 bool ParseDouble(const std::string& text, double& out) {
+    return ParseDouble(std::string_view(text), out);
+}
+
+bool ParseDouble(std::string_view text, double& out) {
     std::size_t b = 0;
     std::size_t e = text.size();
     while (b < e && (text[b] == ' ' || text[b] == '\t' || text[b] == '\n' || text[b] == '\r')) {
         ++b;
     }
-    while (e > b &&
-           (text[e - 1] == ' ' || text[e - 1] == '\t' || text[e - 1] == '\n' || text[e - 1] == '\r')) {
+    while (e > b && (text[e - 1] == ' ' || text[e - 1] == '\t' || text[e - 1] == '\n' ||
+                     text[e - 1] == '\r')) {
         --e;
     }
     if (b == e) {
         return false;
     }
-    // Read in place: this runs for every cell of a data file, several times per fit.
-    const std::string_view t(text.data() + b, e - b);
+    // Read in place: this runs for every cell of a data file.
+    const std::string_view t = text.substr(b, e - b);
     const auto isDigitOrPoint = [](char c) { return (c >= '0' && c <= '9') || c == '.'; };
     const bool numeric = isDigitOrPoint(t[0]) ||
                          ((t[0] == '+' || t[0] == '-') && t.size() > 1 && isDigitOrPoint(t[1]));

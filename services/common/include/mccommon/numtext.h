@@ -3,6 +3,7 @@
 #pragma once
 
 #include <string>
+#include <string_view>
 
 namespace MCCommon_800 {
 
@@ -19,5 +20,11 @@ std::string FormatRoundTrip(double x);
 //! "INF", "-INF", "inf", "NaN" are accepted. False, with `out` untouched, when anything else is
 //! there.
 bool ParseDouble(const std::string& text, double& out);
+//! The same, reading `text` where it lies (a cell of a data file, without a copy).
+bool ParseDouble(std::string_view text, double& out);
+//! The same for a C string (a literal would otherwise fit both overloads above).
+inline bool ParseDouble(const char* text, double& out) {
+    return ParseDouble(std::string_view(text), out);
+}
 
 } // namespace MCCommon_800
