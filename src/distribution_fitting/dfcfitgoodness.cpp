@@ -774,10 +774,11 @@ double DFCFittedCdf::operator()(double x) const {
 // ------------------------------------------------------------------------------------------
 // F over sorted values
 //
-// The Gamma's and the Beta's distribution functions (Boost's incomplete gamma and beta, 100 to
-// 400 ns a value) dominate the EDF tests of a large field, yet neighbouring sorted values are
-// close. So F is computed exactly only at every kStretch-th value and carried in between by
-// integrating the density f from one value to the next with the corrected trapezoid rule
+// The distribution functions (Boost's incomplete gamma and beta, 100 to 400 ns a value; the
+// normal integral, 20 to 30 ns with the LogNormal's logarithm) dominate the EDF tests of a
+// large field, yet neighbouring sorted values are close. So F is computed exactly only at every
+// kStretch-th value and carried in between by integrating the density f from one value to the next
+// with the corrected trapezoid rule
 //   ∫_x0^x1 f = h/2·(f0 + f1) + h²/12·(f0' - f1') - h⁵/720·f⁽⁴⁾(ξ),   h = x1 - x0,
 // (the integral of the cubic Hermite interpolant; Davis and Rabinowitz, "Methods of Numerical
 // Integration", 2nd ed., 1984, section 2.9), with f' = f·(d ln f/dx), one exp and one or two
@@ -802,30 +803,63 @@ constexpr double kCarryTolerance = 1e-13;
 } // namespace
 
 double DFCFittedCdf::ExactTail(double x, bool upper) const {
-    if (fType == kDistGamma) {
+    switch (fType) {
+    case kDistGamma: {
         const double y = fP1 * x;
         return Finite(upper ? boost::math::gamma_q(fP0, y, MCMathPolicy())
                             : boost::math::gamma_p(fP0, y, MCMathPolicy()));
     }
-    return Finite(upper ? boost::math::ibetac(fP0, fP1, x, MCMathPolicy())
-                        : boost::math::ibeta(fP0, fP1, x, MCMathPolicy()));
+    case kDistBeta:
+        return Finite(upper ? boost::math::ibetac(fP0, fP1, x, MCMathPolicy())
+                            : boost::math::ibeta(fP0, fP1, x, MCMathPolicy()));
+    case kDistNormal:
+        return upper ? MCDistFun::CdfStdNorm(-((x - fP0) / fP1)) : (*this)(x);
+    case kDistLognormal:
+        return upper ? (x > 0.0 ? MCDistFun::CdfStdNorm(-(std::log(x / fP0) / fP1)) : 1.0)
+                     : (*this)(x);
+    default:
+        return kMissing;
+    }
 }
 
 bool DFCFittedCdf::Density(double x, double& f, double& slope) const {
-    // Gamma (shape α, rate β): ln f = (α-1)·ln x - βx - (ln Γ(α) - α·ln β).
-    // Beta (a, b): ln f = (a-1)·ln x + (b-1)·ln(1-x) - ln B(a, b).
-    if (fType == kDistGamma) {
+    constexpr double kInvRootTwoPi = 0.398942280401432677939946059934;
+    switch (fType) {
+    case kDistGamma:
+        // Shape α, rate β: ln f = (α-1)·ln x - βx - (ln Γ(α) - α·ln β).
         if (!(x > 0.0)) {
             return false;
         }
         f = std::exp((fP0 - 1.0) * std::log(x) - fP1 * x - fLogNorm);
         slope = (fP0 - 1.0) / x - fP1;
-    } else {
+        break;
+    case kDistBeta:
+        // ln f = (a-1)·ln x + (b-1)·ln(1-x) - ln B(a, b).
         if (!(x > 0.0 && x < 1.0)) {
             return false;
         }
         f = std::exp((fP0 - 1.0) * std::log(x) + (fP1 - 1.0) * std::log1p(-x) - fLogNorm);
         slope = (fP0 - 1.0) / x - (fP1 - 1.0) / (1.0 - x);
+        break;
+    case kDistNormal: {
+        // z = (x - μ)/σ: f = φ(z)/σ, d ln f/dx = -z/σ.
+        const double z = (x - fP0) / fP1;
+        f = kInvRootTwoPi * std::exp(-0.5 * z * z) / fP1;
+        slope = -z / fP1;
+        break;
+    }
+    case kDistLognormal: {
+        // z = ln(x/a)/b: f = φ(z)/(x·b), d ln f/dx = -(z/b + 1)/x.
+        if (!(x > 0.0)) {
+            return false;
+        }
+        const double z = std::log(x / fP0) / fP1;
+        f = kInvRootTwoPi * std::exp(-0.5 * z * z) / (x * fP1);
+        slope = -(z / fP1 + 1.0) / x;
+        break;
+    }
+    default:
+        return false;
     }
     return std::isfinite(f) && f > 0.0 && std::isfinite(slope);
 }
@@ -901,7 +935,8 @@ bool DFCFittedCdf::CarryStretch(const double* x, std::size_t begin, std::size_t 
 }
 
 void DFCFittedCdf::EvaluateSorted(const double* x, std::size_t n, double* u) const {
-    const bool carry = fbValid && (fType == kDistGamma || fType == kDistBeta);
+    const bool carry = fbValid && (fType == kDistGamma || fType == kDistBeta ||
+                                   fType == kDistNormal || fType == kDistLognormal);
     std::array<double, 2 * (kStretch + kMinStretch + 1)> work{};
     std::size_t begin = 0;
     while (begin < n) {

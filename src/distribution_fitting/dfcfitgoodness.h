@@ -60,15 +60,16 @@ public:
     //! finite, a scale that is not positive) or the library gives none.
     double operator()(double x) const;
     //! u_i = F(x_i) for `n` values in ascending order (ties get the same u), as operator()
-    //! gives them to within about 1e-13 relative, far cheaper for the Gamma and the Beta:
+    //! gives them to within about 1e-13 relative, far cheaper for the Gamma, the Beta, the
+    //! Normal and the LogNormal:
     //! between exact values every 32 entries, F is carried from entry to entry by integrating
     //! the density (see the .cpp).
     void EvaluateSorted(const double* x, std::size_t n, double* u) const;
 
 private:
-    //! The exact F(x) (`upper` false) or 1 - F(x) (`upper` true) of the Gamma or the Beta.
+    //! The exact F(x) (`upper` false) or 1 - F(x) (`upper` true) of a carried candidate.
     double ExactTail(double x, bool upper) const;
-    //! The density f(x) of the Gamma or the Beta and its relative slope f'(x)/f(x); false
+    //! The density f(x) of a carried candidate and its relative slope f'(x)/f(x); false
     //! outside the open support or where either is not finite.
     bool Density(double x, double& f, double& slope) const;
     //! Carries F over the entries [begin, end] of one stretch (see the .cpp); false when

@@ -155,7 +155,7 @@ std::vector<double> SortedValues(const SortedCdfCase& c) {
         const double p = (static_cast<double>(i) + 0.5 + 0.4 * std::sin(3.7 * i)) / c.n;
         // Quantiles by bisection on the exact F: slow, independent of the code under test.
         const DFCFittedCdf cdf(c.type, c.params);
-        double lo = 0.0;
+        double lo = c.type == kDistNormal ? -1e4 : 0.0;
         double hi = beta ? 1.0 : 1e4;
         for (int k = 0; k < 200 && hi - lo > 1e-15 * hi; ++k) {
             const double mid = 0.5 * (lo + hi);
@@ -206,7 +206,11 @@ INSTANTIATE_TEST_SUITE_P(
                       SortedCdfCase{"Beta2_5", kDistBeta, {2.0, 5.0}, 5000},
                       SortedCdfCase{"BetaPolesAtBothEnds", kDistBeta, {0.5, 0.7}, 5000},
                       SortedCdfCase{"BetaLargeShapes", kDistBeta, {300.0, 500.0}, 3000},
-                      SortedCdfCase{"NormalIsExact", kDistNormal, {0.5, 0.2}, 500}),
+                      SortedCdfCase{"Normal", kDistNormal, {100.0, 15.0}, 5000},
+                      SortedCdfCase{"NormalNarrow", kDistNormal, {0.5, 1e-6}, 3000},
+                      SortedCdfCase{"LogNormal", kDistLognormal, {2.7, 0.5}, 5000},
+                      SortedCdfCase{"LogNormalWide", kDistLognormal, {1.0, 3.0}, 5000},
+                      SortedCdfCase{"WeibullIsExact", kDistWeibull, {5.0, 1.8, 0.0}, 500}),
     ByName());
 
 struct BadCdf {
