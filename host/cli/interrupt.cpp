@@ -41,6 +41,10 @@ InterruptWatcher::InterruptWatcher() {
 InterruptWatcher::~InterruptWatcher() {
     fbStop.store(true);
     if (fWatcher.joinable()) {
+        // Wake the watcher at once rather than at the end of its wait (up to 0.1 s added to
+        // every command's exit): a SIGINT sent to that thread alone, which it takes as the
+        // stop since fbStop is set.
+        ::pthread_kill(fWatcher.native_handle(), SIGINT);
         fWatcher.join();
     }
     if (fbMasked) {
@@ -58,7 +62,7 @@ void InterruptWatcher::Watch() {
     const sigset_t set = InterruptSet();
     const timespec wait{0, 100 * 1000 * 1000};
     while (!fbStop.load()) {
-        if (::sigtimedwait(&set, nullptr, &wait) != SIGINT) {
+        if (::sigtimedwait(&set, nullptr, &wait) != SIGINT || fbStop.load()) {
             continue;
         }
         if (fbInterrupted.exchange(true)) {

@@ -455,9 +455,11 @@ struct FormulaScoreComputer::Impl {
         long fLine = 0;                               //!< first line using it
     };
 
-    std::vector<double> fvSlots;                        //!< one value per name; never resized
-    std::vector<char> fvMissing;                        //!< slot holds a missing value
-    std::vector<InputBinding> fvInputs;                 //!< inputs in first-use order
+    std::vector<double> fvSlots;        //!< one value per name; never resized
+    std::vector<char> fvMissing;        //!< slot holds a missing value
+    std::vector<InputBinding> fvInputs; //!< inputs in first-use order
+    //! The layout id of the input record whose places the bindings hold (0: none checked).
+    std::uint64_t fBoundLayout = 0;
     std::vector<int> fvTargetSlots;                     //!< slot of each target
     std::vector<std::vector<int>> fvTargetUses;         //!< slots each target's expression reads
     std::vector<std::unique_ptr<mu::Parser>> fvParsers; //!< one per target
@@ -589,11 +591,13 @@ MCStatus FormulaScoreComputer::ScoreRecord(const ValueRecord& input, ValueRecord
         }
     };
 
-    // The inputs, by the positions found when preparing (checked by name, since a caller may
-    // hand in a record of another layout).
+    // The inputs, by the positions found when preparing, checked by name whenever the record's
+    // layout is not the one they were last checked against (a caller may hand in a record of
+    // another layout; the simulation hands in the same one case after case).
+    const bool placesChecked = input.GetLayoutId() == impl.fBoundLayout;
     for (Impl::InputBinding& b : impl.fvInputs) {
         int pos = b.fPosition;
-        if (pos < 0 || pos >= input.Size() || input.GetName(pos) != b.fName) {
+        if (!placesChecked && (pos < 0 || pos >= input.Size() || input.GetName(pos) != b.fName)) {
             pos = input.IndexOf(b.fName);
             b.fPosition = pos;
         }
@@ -608,7 +612,7 @@ MCStatus FormulaScoreComputer::ScoreRecord(const ValueRecord& input, ValueRecord
         if (v.GetType() == Value::kReal) {
             x = v.GetReal();
         } else if (v.GetType() == Value::kString) {
-            const std::string text = v.GetString();
+            const std::string& text = v.GetText();
             if (b.fpLevels) {
                 const auto& labels = b.fpLevels->fvLabels;
                 const auto it = std::find(labels.begin(), labels.end(), text);
@@ -638,6 +642,7 @@ MCStatus FormulaScoreComputer::ScoreRecord(const ValueRecord& input, ValueRecord
         impl.fvSlots[slot] = x;
         impl.fvMissing[slot] = MCMV::IsMissing(x) ? 1 : 0;
     }
+    impl.fBoundLayout = input.GetLayoutId();
 
     for (std::size_t k = 0; k < targets.size(); ++k) {
         const FormulaTarget& t = targets[k];

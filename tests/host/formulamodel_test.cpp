@@ -85,6 +85,30 @@ TEST(FormulaModel, ScoresTargetsInOrderWithEarlierTargetsAndTextLevels) {
     }
 }
 
+TEST(FormulaModel, InputsAreFoundAgainWhenTheRecordsLayoutChanges) {
+    // Places found in one record are reused case after case; a record with the names in
+    // another order, or the same record cleared and refilled so, must be read by name again.
+    FormulaScoreFactory factory(Model("diff = a - b\n"));
+    auto computer = factory.CreateScoreComputer();
+    ValueRecord input = Inputs({{"a", Value(5.0)}, {"b", Value(3.0)}});
+    ValueRecord output;
+    ASSERT_TRUE(computer->PrepareOutputRecord(input, output).IsOK());
+    ASSERT_TRUE(computer->ScoreRecord(input, output).IsOK());
+    EXPECT_EQ(output[0].GetReal(), 2.0);
+    const ValueRecord swapped = Inputs({{"b", Value(5.0)}, {"a", Value(3.0)}});
+    ASSERT_TRUE(computer->ScoreRecord(swapped, output).IsOK());
+    EXPECT_EQ(output[0].GetReal(), -2.0);
+    input.Clear();
+    input.Add("b", Value(1.0));
+    input.Add("a", Value(10.0));
+    ASSERT_TRUE(computer->ScoreRecord(input, output).IsOK());
+    EXPECT_EQ(output[0].GetReal(), 9.0);
+    input.Remove("b");
+    input.Add("b", Value(4.0));
+    ASSERT_TRUE(computer->ScoreRecord(input, output).IsOK());
+    EXPECT_EQ(output[0].GetReal(), 6.0);
+}
+
 TEST(FormulaModel, TargetVariablesCarryLevelsAndLabels) {
     FormulaScoreFactory factory(Model(kProfitModel));
     auto computer = factory.CreateScoreComputer();

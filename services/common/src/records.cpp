@@ -4,6 +4,7 @@
 #include "mccommon/numtext.h"
 
 #include <algorithm>
+#include <atomic>
 
 namespace MCXML_800 {
 
@@ -78,7 +79,17 @@ void Value::SetList(std::vector<ListEntry> list) {
     fList = std::move(list);
 }
 
-ValueRecord::ValueRecord(int capacity) {
+namespace {
+
+//! A layout id no record has had yet (from 1; ids are shared by all threads).
+std::uint64_t NewLayoutId() {
+    static std::atomic<std::uint64_t> next{1};
+    return next.fetch_add(1, std::memory_order_relaxed);
+}
+
+} // namespace
+
+ValueRecord::ValueRecord(int capacity) : fLayoutId(NewLayoutId()) {
     if (capacity > 0) {
         fNames.reserve(static_cast<std::size_t>(capacity));
         fValues.reserve(static_cast<std::size_t>(capacity));
@@ -93,6 +104,7 @@ int ValueRecord::Add(const std::string& name, const Value& value) {
     }
     fNames.push_back(name);
     fValues.push_back(value);
+    fLayoutId = NewLayoutId();
     return Size() - 1;
 }
 
@@ -108,12 +120,14 @@ bool ValueRecord::Remove(const std::string& name) {
     }
     fNames.erase(fNames.begin() + at);
     fValues.erase(fValues.begin() + at);
+    fLayoutId = NewLayoutId();
     return true;
 }
 
 void ValueRecord::Clear() {
     fNames.clear();
     fValues.clear();
+    fLayoutId = NewLayoutId();
 }
 
 } // namespace MCXML_800

@@ -3,6 +3,7 @@
 #pragma once
 
 #include <cstddef>
+#include <cstdint>
 #include <string>
 #include <utility>
 #include <vector>
@@ -94,10 +95,16 @@ public:
     const std::string& GetName(int i) const { return fNames[static_cast<std::size_t>(i)]; }
     Value& operator[](int i) { return fValues[static_cast<std::size_t>(i)]; }
     const Value& operator[](int i) const { return fValues[static_cast<std::size_t>(i)]; }
+    //! Names the record's layout: a new number (never 0) whenever its names change (a new name
+    //! added, one removed, Clear), kept by copies. Two records of the same layout id hold the
+    //! same names in the same order, so a scorer that found its inputs' places in one record
+    //! can skip looking them up again, case after case.
+    std::uint64_t GetLayoutId() const { return fLayoutId; }
 
 private:
     std::vector<std::string> fNames; //!< names in order
     std::vector<Value> fValues;      //!< values parallel to the names
+    std::uint64_t fLayoutId;         //!< see GetLayoutId
 };
 
 } // namespace MCXML_800
