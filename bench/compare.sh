@@ -3,7 +3,9 @@
 #   W-FIT-1  fitting a 200,000-row CSV file (bench/wfit1_data.h): mcsim fit, SciPy,
 #            R fitdistrplus;
 #   W-SIM-1  simulating 1,000,000 cases of six correlated inputs, one categorical input and a
-#            linear target (bench/gen_wsim1.cpp): mcsim simulate, NumPy/SciPy, OpenTURNS.
+#            linear target (bench/gen_wsim1.cpp): mcsim simulate, NumPy/SciPy, OpenTURNS,
+#            and the same run inside the component with the target compiled
+#            (simulation_bench), on one and on two cores.
 #
 #   bench/compare.sh [BUILD_DIR]        BUILD_DIR defaults to build-release in the repository
 #
@@ -61,7 +63,7 @@ build_mcsim() {
             >/dev/null
     fi
     mkdir -p "$out"
-    if ! cmake --build "$build" -j "$(nproc)" --target mcsim_cli gen_wfit1 gen_wsim1 \
+    if ! cmake --build "$build" -j "$(nproc)" --target mcsim_cli gen_wfit1 gen_wsim1 simulation_bench \
         >"$out/build.log" 2>&1; then
         tail -n 30 "$out/build.log" >&2
         echo "compare: the build failed (whole log in $out/build.log)" >&2
@@ -145,6 +147,20 @@ t=$(run sim-ot "$core" "$out/wsim1-openturns.json" \
     "$python" "$repo/bench/peers/wsim1_openturns.py" "$out/wsim1-openturns.json" "$cases" "$seed")
 row sim-ot W-SIM-1 OpenTURNS 1 1 "$cases" "$out/wsim1-openturns.json" "$t" ""
 
+# The same simulation inside the component, with the linear target compiled in C++ instead of
+# the command's formula interpreter (bench/simulation_bench.cpp): the component's own speed.
+component=$out/wsim1-component.json
+: >"$component"
+echo "compare: W-SIM-1 in the component, on 1 and on 2 cores"
+for setup in "1 $core" "2 $cores2"; do
+    read -r threads cpus <<<"$setup"
+    taskset -c "$cpus" "$build/bin/simulation_bench" \
+        --benchmark_filter="BM_SimulateWSim1/threads:$threads/" \
+        --benchmark_repetitions="$((repeat > 5 ? repeat : 5))" --benchmark_format=json \
+        >"$out/log/component-t$threads.json" 2>"$out/log/component-t$threads.err" || true
+    echo "$threads $out/log/component-t$threads.json" >>"$component"
+done
+
 # ---------------------------------------------------------------------------------------------
 # The table and the checks
 commit=$(git -C "$repo" rev-parse --short HEAD 2>/dev/null || echo unknown)
@@ -158,7 +174,7 @@ git -C "$repo" diff --quiet HEAD 2>/dev/null || commit="$commit plus uncommitted
     echo
 } >"$out/header.txt"
 status=0
-"$python" "$repo/bench/peers/summarize.py" "$runs" "$out/table-body.md" || status=1
+"$python" "$repo/bench/peers/summarize.py" "$runs" "$out/table-body.md" "$component" || status=1
 cat "$out/header.txt" "$out/table-body.md" >"$out/table.md"
 echo
 echo "compare: table written to $out/table.md"

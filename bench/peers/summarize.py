@@ -291,9 +291,43 @@ def table(rows):
     return out
 
 
+def component_lines(path):
+    """W-SIM-1 inside the component: the median cases per second of simulation_bench's runs on
+    one and on two threads (a list of "THREADS JSON" lines in `path`), against the targets."""
+    rates = {}
+    try:
+        listing = open(path, encoding="utf-8").read().split("\n")
+    except OSError:
+        return []
+    for line in listing:
+        if not line.strip():
+            continue
+        threads, json_path = line.split(" ", 1)
+        try:
+            doc = json.load(open(json_path, encoding="utf-8"))
+        except (OSError, ValueError):
+            continue
+        per_run = sorted(b["items_per_second"] for b in doc.get("benchmarks", [])
+                         if b.get("run_type") == "iteration" and "items_per_second" in b)
+        if per_run:
+            rates[int(threads)] = per_run[len(per_run) // 2]
+    if 1 not in rates:
+        return ["", "W-SIM-1 in the component: simulation_bench did not run (see the log)"]
+    one = rates[1]
+    out = ["", "W-SIM-1 in the component (bench/simulation_bench.cpp, the linear target compiled, "
+               "median of the repetitions):",
+           f"- one core: {fmt_rate(one)} cases/s (target 5 M: "
+           f"{'met' if one >= 5e6 else 'not met'})"]
+    if 2 in rates:
+        ratio = rates[2] / one
+        out.append(f"- two threads on two cores: {fmt_rate(rates[2])} cases/s, {ratio:.2f} times "
+                   f"one core (target 1.8: {'met' if ratio >= 1.8 else 'not met'})")
+    return out
+
+
 def main():
-    if len(sys.argv) != 3:
-        sys.exit("usage: summarize.py RUNS.tsv OUT.md")
+    if len(sys.argv) not in (3, 4):
+        sys.exit("usage: summarize.py RUNS.tsv OUT.md [COMPONENT.txt]")
     rows = read_runs(sys.argv[1])
     lines = table(rows)
     checks = ["", "Agreement:"]
@@ -320,7 +354,8 @@ def main():
                 speed.append(f"- mcsim fit is {r:.1f} times as fast as {tool} by wall clock, "
                              f"{c:.1f} times by CPU time (target {need:.0f}: "
                              f"{'met' if min(r, c) >= need else 'not met'})")
-    text = "\n".join(lines + checks + ([""] + speed if speed else [])) + "\n"
+    component = component_lines(sys.argv[3]) if len(sys.argv) == 4 else []
+    text = "\n".join(lines + checks + ([""] + speed if speed else []) + component) + "\n"
     sys.stdout.write(text)
     with open(sys.argv[2], "w", encoding="utf-8") as f:
         f.write(text)
