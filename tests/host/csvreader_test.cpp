@@ -18,6 +18,23 @@ using MCHost::CsvReader;
 using MCHost::HostError;
 using Rows = std::vector<std::vector<std::string>>;
 
+//! Every record of `reader` and the line each begins on, read into one reused vector (so the
+//! strings left from a longer record are reused, as the data passes do).
+struct ReadBack {
+    Rows rows;
+    std::vector<long> lines;
+    std::vector<std::string> last; //!< the vector after the final, failed read
+};
+
+ReadBack ReadAll(CsvReader& reader) {
+    ReadBack out;
+    while (reader.ReadRecord(out.last)) {
+        out.rows.push_back(out.last);
+        out.lines.push_back(reader.GetRecordLine());
+    }
+    return out;
+}
+
 struct GoodCase {
     const char* name;
     std::string text;
@@ -32,15 +49,9 @@ TEST_P(CsvReaderGood, SplitsRecordsAndCountsLines) {
     const GoodCase& c = GetParam();
     std::istringstream in(c.text);
     CsvReader reader(in, "f.csv", c.delimiter);
-    Rows rows;
-    std::vector<long> lines;
-    std::vector<std::string> fields;
-    while (reader.ReadRecord(fields)) {
-        rows.push_back(fields);
-        lines.push_back(reader.GetRecordLine());
-    }
-    EXPECT_EQ(rows, c.rows);
-    EXPECT_EQ(lines, c.lines);
+    const ReadBack read = ReadAll(reader);
+    EXPECT_EQ(read.rows, c.rows);
+    EXPECT_EQ(read.lines, c.lines);
     EXPECT_EQ(reader.GetBytesRead(), c.text.size());
 }
 
@@ -249,20 +260,13 @@ TEST(CsvReader, ReadsBackRecordsWrittenAcrossBlockBoundaries) {
             const WrittenFile file = WriteRandomFile(seed, delimiter, 5 * CsvReader::kBufferBytes);
             std::istringstream in(file.text);
             CsvReader reader(in, "w.csv", delimiter);
-            // One vector for all records: the strings left from a longer record are reused.
-            std::vector<std::string> fields;
-            Rows rows;
-            std::vector<long> lines;
-            while (reader.ReadRecord(fields)) {
-                rows.push_back(fields);
-                lines.push_back(reader.GetRecordLine());
+            const ReadBack read = ReadAll(reader);
+            EXPECT_TRUE(read.last.empty());
+            ASSERT_EQ(read.rows.size(), file.rows.size()) << "seed " << seed;
+            for (std::size_t r = 0; r < read.rows.size(); ++r) {
+                ASSERT_EQ(read.rows[r], file.rows[r]) << "seed " << seed << ", record " << r;
             }
-            EXPECT_TRUE(fields.empty());
-            ASSERT_EQ(rows.size(), file.rows.size()) << "seed " << seed;
-            for (std::size_t r = 0; r < rows.size(); ++r) {
-                ASSERT_EQ(rows[r], file.rows[r]) << "seed " << seed << ", record " << r;
-            }
-            EXPECT_EQ(lines, file.lines) << "seed " << seed;
+            EXPECT_EQ(read.lines, file.lines) << "seed " << seed;
             EXPECT_EQ(reader.GetBytesRead(), file.text.size());
         }
     }
@@ -279,18 +283,13 @@ TEST(CsvReader, ReadsEveryTokenSplitByTheBlockBoundary) {
         ASSERT_EQ(text.find(tail), CsvReader::kBufferBytes - at);
         std::istringstream in(text);
         CsvReader reader(in, "t.csv");
-        std::vector<std::string> fields;
-        Rows rows;
-        std::vector<long> lines;
-        while (reader.ReadRecord(fields)) {
-            rows.push_back(fields);
-            lines.push_back(reader.GetRecordLine());
-        }
+        const ReadBack read = ReadAll(reader);
         const Rows expected = {{"h1", "h2"},  {"x", std::string(padding, 'y')},
                                {"q\"r", "s"}, {"t\r\nu", "", "v"},
                                {"w"},         {"", "z"}};
-        EXPECT_EQ(rows, expected) << "boundary before byte " << at;
-        EXPECT_EQ(lines, (std::vector<long>{1, 2, 3, 4, 6, 8})) << "boundary before byte " << at;
+        EXPECT_EQ(read.rows, expected) << "boundary before byte " << at;
+        EXPECT_EQ(read.lines, (std::vector<long>{1, 2, 3, 4, 6, 8}))
+            << "boundary before byte " << at;
         EXPECT_EQ(reader.GetBytesRead(), text.size());
     }
 }
