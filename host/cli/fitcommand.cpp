@@ -753,18 +753,8 @@ int RunFit(const FitOptions& options, std::ostream& out, std::ostream& err) {
         err << "mcsim: cancelled while reading " << options.fDataPath
             << "; nothing was fitted or written\n";
         return 130;
-    } catch (const HostError& e) {
-        progress.Clear();
-        err << "mcsim: " << e.what() << "\n";
-        return 1;
-    } catch (const std::bad_alloc&) {
-        progress.Clear();
-        err << "mcsim: out of memory\n";
-        return 1;
-    } catch (const std::exception& e) {
-        progress.Clear();
-        err << "mcsim: " << e.what() << "\n";
-        return 1;
+    } catch (...) {
+        return ReportCommandFailure(progress, err);
     }
 }
 

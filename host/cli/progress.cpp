@@ -2,6 +2,8 @@
 
 #include <algorithm>
 #include <cstdio>
+#include <exception>
+#include <new>
 
 #include <unistd.h>
 
@@ -48,6 +50,20 @@ void ProgressBar::Clear() {
     fbShown = false;
     fLastPercent = -1;
     fLastLabel.clear();
+}
+
+int ReportCommandFailure(ProgressBar& progress, std::ostream& err) {
+    progress.Clear();
+    try {
+        throw;
+    } catch (const std::bad_alloc&) {
+        err << "mcsim: out of memory\n";
+    } catch (const std::exception& e) {
+        err << "mcsim: " << e.what() << "\n";
+    } catch (...) {
+        err << "mcsim: an unexpected failure\n";
+    }
+    return 1;
 }
 
 } // namespace MCHost

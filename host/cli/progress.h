@@ -4,6 +4,7 @@
 #pragma once
 
 #include <cstdint>
+#include <ostream>
 #include <string>
 
 namespace MCHost {
@@ -29,5 +30,10 @@ private:
     int fLastPercent = -1;  //!< percentage last drawn
     std::string fLastLabel; //!< label last drawn
 };
+
+//! For a command's `catch (...)`: clears `progress` and prints the exception being handled as
+//! one "mcsim: ..." line on `err` ("out of memory" for std::bad_alloc, the message of any
+//! other std::exception). Returns the command's exit status, 1.
+int ReportCommandFailure(ProgressBar& progress, std::ostream& err);
 
 } // namespace MCHost

@@ -558,18 +558,8 @@ int RunSimulate(const SimulateOptions& options, std::ostream& out, std::ostream&
         }
         CommitOutputs(options, report, json.get(), sink.get(), out);
         return 0;
-    } catch (const HostError& e) {
-        progress.Clear();
-        err << "mcsim: " << e.what() << "\n";
-        return 1;
-    } catch (const std::bad_alloc&) {
-        progress.Clear();
-        err << "mcsim: out of memory\n";
-        return 1;
-    } catch (const std::exception& e) {
-        progress.Clear();
-        err << "mcsim: " << e.what() << "\n";
-        return 1;
+    } catch (...) {
+        return ReportCommandFailure(progress, err);
     }
 }
 
