@@ -39,7 +39,7 @@ void ChanPool(double wB, double meanB, double m2B, double& wA, double& meanA, do
 }
 
 //! Adds c·d·dᵀ to the packed lower triangle `packed` (row i holds i + 1 entries).
-void AddOuterProduct(int n, double c, const double* d, double* packed) {
+inline void AddOuterProduct(int n, double c, const double* d, double* packed) {
     for (int i = 0; i < n; ++i) {
         const double di = c * d[i];
         for (int j = 0; j <= i; ++j) {
@@ -51,13 +51,7 @@ void AddOuterProduct(int n, double c, const double* d, double* packed) {
 
 //! The same for a size known when compiling, so that the loops unroll.
 template <int N> void AddOuterProduct(double c, const double* d, double* packed) {
-    for (int i = 0; i < N; ++i) {
-        const double di = c * d[i];
-        for (int j = 0; j <= i; ++j) {
-            packed[j] += di * d[j];
-        }
-        packed += i + 1;
-    }
+    AddOuterProduct(N, c, d, packed);
 }
 
 //! A variance from a sum of squared deviations: missing when that sum overflowed.
@@ -308,31 +302,20 @@ bool MCProvMeans::Update(const double* values, int n, double weight) {
         // A simulation updates a handful of variables per case: the loops unrolled for its
         // sizes run several times faster than the general triangle (same operations, same
         // order, same result).
-        switch (n) {
-        case 2:
-            AddOuterProduct<2>(rc, delta, fvXProdSums.data());
-            break;
-        case 3:
-            AddOuterProduct<3>(rc, delta, fvXProdSums.data());
-            break;
-        case 4:
-            AddOuterProduct<4>(rc, delta, fvXProdSums.data());
-            break;
-        case 5:
-            AddOuterProduct<5>(rc, delta, fvXProdSums.data());
-            break;
-        case 6:
-            AddOuterProduct<6>(rc, delta, fvXProdSums.data());
-            break;
-        case 7:
-            AddOuterProduct<7>(rc, delta, fvXProdSums.data());
-            break;
-        case 8:
-            AddOuterProduct<8>(rc, delta, fvXProdSums.data());
-            break;
-        default:
+        using Kernel = void (*)(double, const double*, double*);
+        static constexpr Kernel kUnrolled[] = {nullptr,
+                                               nullptr,
+                                               &AddOuterProduct<2>,
+                                               &AddOuterProduct<3>,
+                                               &AddOuterProduct<4>,
+                                               &AddOuterProduct<5>,
+                                               &AddOuterProduct<6>,
+                                               &AddOuterProduct<7>,
+                                               &AddOuterProduct<8>};
+        if (n >= 2 && n <= 8) {
+            kUnrolled[n](rc, delta, fvXProdSums.data());
+        } else {
             AddOuterProduct(n, rc, delta, fvXProdSums.data());
-            break;
         }
         fbXProdsStale = true;
     }
