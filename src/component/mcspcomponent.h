@@ -34,6 +34,8 @@ inline constexpr long kPoorBestFit = 390013;
 inline constexpr long kAttemptsExhausted = 390014;
 inline constexpr long kCorrelationAdjusted = 390015;
 inline constexpr long kScatterPlotsLimited = 390016;
+//! A planned input correlation lies outside the range its two distributions can attain.
+inline constexpr long kCorrelationUnreachable = 390017;
 } // namespace MCSPStatus
 
 //! "Simulation Component Ver. 1.0" followed by the copyright notice.

@@ -40,6 +40,7 @@ public:
     std::string fSensIteraName;                          //!< the input varied over the iterations
     std::vector<MCContStats> fvCovarStats;               //!< one per covariate
     MCSymMatrix fSimulCorr;                              //!< correlations among the covariates
+    std::vector<SECInputCorrelationPair> fvCorrPairs;    //!< the correlation model's pairs
     std::vector<double> fvCrstSimProbs; //!< share of valid cases per contingency cell
     SECOutputStats::PMMLModelType fModelType = MCXML_800::IMCScoreComputer::kOther; //!< model
     MCCommon_800::MCWarnings fWarnings;          //!< warnings of the results
@@ -230,6 +231,12 @@ const MCSymMatrix& SECOutputStats::GetSimulCorr() const {
 }
 MCSymMatrix& SECOutputStats::GetSimulCorr() {
     return fpImpl->fSimulCorr;
+}
+const std::vector<SECInputCorrelationPair>& SECOutputStats::GetInputCorrelationPairs() const {
+    return fpImpl->fvCorrPairs;
+}
+std::vector<SECInputCorrelationPair>& SECOutputStats::GetInputCorrelationPairs() {
+    return fpImpl->fvCorrPairs;
 }
 const std::vector<double>& SECOutputStats::GetCrstSimProbs() const {
     return fpImpl->fvCrstSimProbs;

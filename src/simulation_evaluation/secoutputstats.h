@@ -84,6 +84,19 @@ struct SECCategoricalTargetInfo {
     void Display() const;
 };
 
+//! One pair of correlated inputs (a non-zero target in the plan): what the plan asks, what the
+//! correlation model could give, and what the cases show. Numbers not known are missing.
+struct SECInputCorrelationPair {
+    std::string fFirst;                                   //!< input
+    std::string fSecond;                                  //!< input
+    double fTarget = MCCommon_800::MCMV::Missing();       //!< the plan's correlation ρ
+    double fNormalCorr = MCCommon_800::MCMV::Missing();   //!< the normal-scale value used
+    double fAttainableLow = MCCommon_800::MCMV::Missing();  //!< g(−1), the lowest attainable
+    double fAttainableHigh = MCCommon_800::MCMV::Missing(); //!< g(+1), the highest attainable
+    double fSimulated = MCCommon_800::MCMV::Missing();    //!< correlation of the valid cases
+    bool fbUnreachable = false; //!< ρ lies outside [fAttainableLow, fAttainableHigh]
+};
+
 class SECOutputStats {
 public:
     using PMMLModelType = MCXML_800::IMCScoreComputer::PMMLModelType;
@@ -157,6 +170,9 @@ public:
     //! Simulated correlations among the covariates.
     const MCMath_800::MCSymMatrix& GetSimulCorr() const;
     MCMath_800::MCSymMatrix& GetSimulCorr();
+    //! The pairs of the correlation model with a non-zero target, in pair order.
+    const std::vector<SECInputCorrelationPair>& GetInputCorrelationPairs() const;
+    std::vector<SECInputCorrelationPair>& GetInputCorrelationPairs();
     //! Share of the valid cases in each contingency cell; empty without a contingency table.
     const std::vector<double>& GetCrstSimProbs() const;
     std::vector<double>& GetCrstSimProbs();

@@ -1133,6 +1133,25 @@ MCStatus SECSimulator::CompleteStats() {
         }
     }
 
+    // The correlation model's pairs with a target, with the correlation their cases show.
+    std::vector<SECInputCorrelationPair>& corrPairs = results.GetInputCorrelationPairs();
+    corrPairs.clear();
+    for (const SECNortaPair& pair : fvNortaPairs) {
+        if (pair.fTarget == 0.0 || MCMV::IsMissing(pair.fTarget)) {
+            continue;
+        }
+        SECInputCorrelationPair entry;
+        entry.fFirst = fvCorrelated[static_cast<std::size_t>(pair.fRow)].fGenerator.fName;
+        entry.fSecond = fvCorrelated[static_cast<std::size_t>(pair.fCol)].fGenerator.fName;
+        entry.fTarget = pair.fTarget;
+        entry.fNormalCorr = pair.fNormalCorr;
+        entry.fAttainableLow = pair.fGLow;
+        entry.fAttainableHigh = pair.fGHigh;
+        entry.fSimulated = CrossProductCorrelation(xprods, pair.fRow, pair.fCol);
+        entry.fbUnreachable = pair.fbUnreachable;
+        corrPairs.push_back(std::move(entry));
+    }
+
     std::vector<double>& cellShares = results.GetCrstSimProbs();
     cellShares.clear();
     if (fbHasCrosstab) {

@@ -393,8 +393,10 @@ std::unique_ptr<SECSimulator> SECSimulator::CreateWorker(double seedValue) const
     return std::unique_ptr<SECSimulator>(new SECSimulator(*this, seedValue, WorkerTag()));
 }
 
-void SECSimulator::SetNortaPairs(const std::vector<SECNortaPair>& pairs) {
+void SECSimulator::SetNortaPairs(const std::vector<SECNortaPair>& pairs,
+                                 std::shared_ptr<const std::vector<SECNortaMargin>> margins) {
     fvNortaPairs = pairs;
+    fpNortaMargins = std::move(margins);
     fbNortaTask = true;
 }
 
@@ -421,16 +423,19 @@ MCStatus SECSimulator::RunNortaPairs() {
         if (fpCancel->WillCancel()) {
             return cancelled;
         }
-        const SECNortaSearchResult result =
-            SECNortaNormalCorrelation(fvCorrelated[static_cast<std::size_t>(pair.fRow)].fGenerator,
-                                      fvCorrelated[static_cast<std::size_t>(pair.fCol)].fGenerator,
-                                      pair.fTarget, *fpStream, pair.fSeed, fpCancel);
+        const std::vector<SECNortaMargin>& margins = *fpNortaMargins;
+        const SECNortaSearchResult result = SECNortaNormalCorrelation(
+            margins[static_cast<std::size_t>(pair.fRow)],
+            margins[static_cast<std::size_t>(pair.fCol)], pair.fTarget, fpCancel);
         if (result.fbCancelled) {
             return cancelled;
         }
         // A missing result does not end the list: the other pairs keep theirs, and the
         // combination gives this one a fallback value.
         pair.fNormalCorr = result.fNormalCorr;
+        pair.fGLow = result.fGLow;
+        pair.fGHigh = result.fGHigh;
+        pair.fbUnreachable = result.fbUnreachable;
         pair.fbComputed = true;
     }
     return MCStatus();
@@ -452,8 +457,15 @@ MCStatus SECSimulator::PrepareCorrelationModel() {
         return fCorrModelStatus;
     }
 
-    // Every pair (i, j), j < i, with its own seed drawn from this stream in pair order, so the
-    // results do not depend on how the pairs are split below.
+    // Each input prepared once; every pair (i, j), j < i, then costs a small fixed amount of
+    // work and its result does not depend on how the pairs are split below.
+    auto margins = std::make_shared<std::vector<SECNortaMargin>>(fvCorrelated.size());
+    for (std::size_t k = 0; k < fvCorrelated.size(); ++k) {
+        if (fpCancel->WillCancel()) {
+            return MCStatus(MCSPStatus::kCancelled, false);
+        }
+        (void)SECPrepareNortaMargin(fvCorrelated[k].fGenerator, (*margins)[k]);
+    }
     std::vector<SECNortaPair> pairs;
     for (int i = 1; i < n; ++i) {
         for (int j = 0; j < i; ++j) {
@@ -461,7 +473,6 @@ MCStatus SECSimulator::PrepareCorrelationModel() {
             pair.fRow = i;
             pair.fCol = j;
             pair.fTarget = fTargetCorr.GetElem(i, j);
-            pair.fSeed = SeedFromValue(fpStream->GetRandom(), fpSettings->GetSeed());
             pair.fNormalCorr = MCMV::Missing();
             pairs.push_back(pair);
         }
@@ -473,7 +484,8 @@ MCStatus SECSimulator::PrepareCorrelationModel() {
     for (std::size_t s = 0; s + 1 < bounds.size(); ++s) {
         workers.push_back(CreateWorker(-1.0));
         workers.back()->SetNortaPairs(
-            std::vector<SECNortaPair>(pairs.begin() + bounds[s], pairs.begin() + bounds[s + 1]));
+            std::vector<SECNortaPair>(pairs.begin() + bounds[s], pairs.begin() + bounds[s + 1]),
+            margins);
         tasks.push_back(workers.back().get());
     }
     MCThread_800::IMCThreadFactory* factory = fpSettings->GetThreadFactory();
@@ -516,6 +528,11 @@ SECSimulator::CombineNortaNormalCorrs(const std::vector<std::unique_ptr<SECSimul
     }
     if (status.IsWarning()) {
         fWarnings.AddWarning(status);
+    }
+    for (const SECNortaPair& pair : fvNortaPairs) {
+        if (pair.fbUnreachable) {
+            fWarnings.AddWarning(MCStatus(MCSPStatus::kCorrelationUnreachable, true));
+        }
     }
     return MCStatus();
 }

@@ -135,13 +135,14 @@ public:
 
     // ---- Preparation -------------------------------------------------------------------
 
-    //! The correlation model (master only): with R and at least two correlated inputs, the
-    //! normal correlation of every pair (SECNortaNormalCorrelation) on worker copies in one
-    //! thread group, each pair seeded from this simulator's stream in pair order, then
+    //! The correlation model (master only): with R and at least two correlated inputs, each
+    //! input prepared once (SECPrepareNortaMargin), the normal correlation of every pair
+    //! (SECNortaNormalCorrelation) on worker copies in one thread group, then
     //! CombineNortaNormalCorrs. With one correlated input R itself. Runs once; later calls
     //! return the first outcome. Code 1 when cancelled (nothing kept), 390010 when no
-    //! positive-definite repair exists (the simulator then refuses to draw), warning 390015
-    //! in GetWarnings when the matrix was adjusted.
+    //! positive-definite repair exists (the simulator then refuses to draw); in GetWarnings
+    //! 390015 when the matrix was adjusted and 390017 once per pair whose target lies outside
+    //! its attainable range.
     MCCommon_800::MCStatus PrepareCorrelationModel();
     //! Resets the case to missing and parameterises the normal generator: one input, a
     //! standard normal; several with a normal matrix, the multivariate normal over it; several
@@ -291,8 +292,9 @@ public:
     //! Cases the case loop draws.
     void SetCaseQuota(int quota) { fCaseQuota = quota; }
     //! Makes the thread task the NORTA work on `pairs` (rows and columns of the correlated
-    //! set).
-    void SetNortaPairs(const std::vector<SECNortaPair>& pairs);
+    //! set) over the prepared `margins`, one per input of the correlated set.
+    void SetNortaPairs(const std::vector<SECNortaPair>& pairs,
+                       std::shared_ptr<const std::vector<SECNortaMargin>> margins);
     //! The pairs with their results after the NORTA work; on the master, every pair of the
     //! last correlation model in pair order.
     const std::vector<SECNortaPair>& GetNortaPairs() const { return fvNortaPairs; }
@@ -486,6 +488,8 @@ private:
     bool fbCorrelationFailed = false;        //!< its repair failed: no case is drawn
     MCCommon_800::MCStatus fCorrModelStatus; //!< outcome of the correlation model
     std::vector<SECNortaPair> fvNortaPairs;  //!< pairs of the NORTA work
+    //! The prepared inputs the NORTA work reads (shared by the master and its NORTA workers).
+    std::shared_ptr<const std::vector<SECNortaMargin>> fpNortaMargins;
     bool fbNortaTask = false;                //!< the thread task is NORTA work
 
     bool fbGenerationPrepared = false;     //!< the normal generator is set
