@@ -138,6 +138,21 @@ std::vector<ReportCorrelation> BuildCorrelations(const SECOutputStats& stats) {
             if (static_cast<int>(j) < simulated.GetNRows()) {
                 pair.fSimulated = simulated.GetElem(static_cast<int>(i), static_cast<int>(j));
             }
+            for (const MCMCSP_800::SECInputCorrelationPair& model : stats.GetInputCorrelationPairs()) {
+                if ((model.fFirst == names[i] && model.fSecond == names[j]) ||
+                    (model.fFirst == names[j] && model.fSecond == names[i])) {
+                    pair.fNormal = model.fNormalCorr;
+                    pair.fLow = model.fAttainableLow;
+                    pair.fHigh = model.fAttainableHigh;
+                    pair.fbUnreachable = model.fbUnreachable;
+                }
+            }
+            const double n = stats.GetValidCaseCount();
+            if (!MCMV::IsMissing(pair.fPlan) && !MCMV::IsMissing(pair.fSimulated) && n > 1) {
+                const double rho = std::clamp(pair.fPlan, -1.0, 1.0);
+                const double se = (1.0 - rho * rho) / std::sqrt(n - 1.0);
+                pair.fDeviation = std::fabs(pair.fSimulated - pair.fPlan) / std::max(se, 1e-12);
+            }
             pairs.push_back(std::move(pair));
         }
     }

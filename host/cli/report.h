@@ -95,12 +95,19 @@ struct ReportCategoricalTarget {
     std::vector<ReportInputMeasures> fvInputs; //!< correlations per covariate
 };
 
-//! One pair of correlated inputs: the correlation the plan asks for and the one simulated.
+//! One pair of correlated inputs: the correlation the plan asks for, what the correlation model
+//! could give, and the one simulated.
 struct ReportCorrelation {
     std::string fFirst;  //!< input
     std::string fSecond; //!< input
     double fPlan;        //!< the plan's (missing when it sets none)
     double fSimulated;   //!< the simulated cases' (missing when not computed)
+    double fNormal = MCCommon_800::MCMV::Missing();  //!< the normal-scale value used
+    double fLow = MCCommon_800::MCMV::Missing();     //!< lowest attainable correlation
+    double fHigh = MCCommon_800::MCMV::Missing();    //!< highest attainable correlation
+    bool fbUnreachable = false;                      //!< the plan's lies outside [fLow, fHigh]
+    //! |simulated − plan| over its standard error (1 − ρ²)/√(n − 1); missing when unknown.
+    double fDeviation = MCCommon_800::MCMV::Missing();
 };
 
 //! One cell of the contingency table of the categorical inputs.

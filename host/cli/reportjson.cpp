@@ -102,7 +102,11 @@ Json Iteration(const ReportIteration& it, const SimulationReport& report) {
         pairs.push_back(Json{{"first", c.fFirst},
                              {"second", c.fSecond},
                              {"plan", Number(c.fPlan)},
-                             {"simulated", Number(c.fSimulated)}});
+                             {"simulated", Number(c.fSimulated)},
+                             {"normal_scale", Number(c.fNormal)},
+                             {"attainable_low", Number(c.fLow)},
+                             {"attainable_high", Number(c.fHigh)},
+                             {"unreachable", c.fbUnreachable}});
     }
     entry["input_correlations"] = std::move(pairs);
     if (it.fvFactors.empty()) {

@@ -177,23 +177,42 @@ void WriteCategorical(std::ostream& out, const ReportCategoricalTarget& t,
     WriteInputMeasures(out, t.fvInputs, report, false);
 }
 
+//! The pairs worth a look: a planned correlation outside the attainable range, or a simulated
+//! one more than 3 standard errors from the plan; the others are counted.
 void WriteCorrelations(std::ostream& out, const ReportIteration& it) {
     if (it.fvCorrelations.empty()) {
         return;
     }
+    std::vector<std::vector<std::string>> rows{
+        {"inputs", "plan", "attainable", "normal scale", "simulated", ""}};
+    std::size_t others = 0;
+    for (const ReportCorrelation& c : it.fvCorrelations) {
+        const bool off = !MCMV::IsMissing(c.fDeviation) && c.fDeviation > 3.0;
+        if (!c.fbUnreachable && !off) {
+            ++others;
+            continue;
+        }
+        if (rows.size() > kMaxPairs) {
+            continue;
+        }
+        const std::string range = MCMV::IsMissing(c.fLow)
+                                      ? "-"
+                                      : "[" + Fixed(c.fLow, 3) + ", " + Fixed(c.fHigh, 3) + "]";
+        rows.push_back({c.fFirst + " ~ " + c.fSecond, Fixed(c.fPlan, 3), range,
+                        MCMV::IsMissing(c.fNormal) ? "-" : Fixed(c.fNormal, 4),
+                        Fixed(c.fSimulated, 3),
+                        c.fbUnreachable ? "unreachable" : "off by " + Fixed(c.fDeviation, 1) + " se"});
+    }
     out << "\ncorrelations of the simulated inputs\n";
-    std::vector<std::vector<std::string>> rows{{"inputs", "plan", "simulated"}};
-    for (std::size_t i = 0; i < it.fvCorrelations.size() && i < kMaxPairs; ++i) {
-        const ReportCorrelation& c = it.fvCorrelations[i];
-        rows.push_back({c.fFirst + " ~ " + c.fSecond,
-                        MCMV::IsMissing(c.fPlan) ? "-" : Fixed(c.fPlan, 3),
-                        Fixed(c.fSimulated, 3)});
+    if (rows.size() > 1) {
+        WriteTable(out, "  ", rows);
     }
-    WriteTable(out, "  ", rows);
-    if (it.fvCorrelations.size() > kMaxPairs) {
-        out << "  ... " << it.fvCorrelations.size() - kMaxPairs
-            << " more pairs (all of them in the JSON results)\n";
+    const std::size_t flagged = it.fvCorrelations.size() - others;
+    if (flagged + 1 > rows.size()) {
+        out << "  ... " << flagged + 1 - rows.size() << " more such pairs (all in the JSON results)\n";
     }
+    out << "  " << others << (others == 1 ? " pair" : " pairs")
+        << " within 3 standard errors of the plan or with none planned (all in the JSON results)\n";
 }
 
 void WriteCells(std::ostream& out, const ReportIteration& it) {

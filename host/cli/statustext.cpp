@@ -45,6 +45,9 @@ std::string StatusText(const MCCommon_800::MCStatus& status) {
         return "the correlation matrix was adjusted to be positive definite";
     case 390016:
         return "scatter plots were limited to 100";
+    case 390017:
+        return "a planned input correlation lies outside the range its two distributions can "
+               "attain: the nearer end of that range was simulated (pairs listed above)";
     case HostStatus::kScoreInput:
         return "an input the model needs is absent or unusable";
     case HostStatus::kScoreEvaluation:

@@ -171,10 +171,13 @@ TEST(McsimSimulate, ExamplePlanMatchesClosedForm) {
     const Json& pair = it.at("input_correlations")[0];
     EXPECT_EQ(pair.at("plan").get<double>(), -0.4);
     EXPECT_NEAR_TOL(pair.at("simulated").get<double>(), -0.4, 0.0, kRhoSlack);
+    EXPECT_LT(pair.at("attainable_low").get<double>(), -0.4);
+    EXPECT_GT(pair.at("attainable_high").get<double>(), -0.4);
+    EXPECT_FALSE(pair.at("unreachable").get<bool>());
 
     // The text report says the same.
     EXPECT_NE(run.out.find("volume_band  (categorical)"), std::string::npos);
-    EXPECT_NE(run.out.find("price ~ units  -0.400"), std::string::npos);
+    EXPECT_NE(run.out.find("1 pair within 3 standard errors"), std::string::npos);
 }
 
 // profit = (price - 12) * units: moving price by one standard deviation (2) moves profit by

@@ -147,6 +147,15 @@ TEST(SimulationReport, JsonCarriesTheResultsWithNullForMissing) {
     stats.SetCovariateNames({"a", "b"});
     stats.GetSimulCorr().SetNRows(2);
     stats.GetSimulCorr().SetElem(0, 1, 0.48);
+    MCMCSP_800::SECInputCorrelationPair ab;
+    ab.fFirst = "b";
+    ab.fSecond = "a";
+    ab.fTarget = 0.5;
+    ab.fNormalCorr = 1.0;
+    ab.fAttainableLow = -0.3;
+    ab.fAttainableHigh = 0.45;
+    ab.fbUnreachable = true;
+    stats.GetInputCorrelationPairs().push_back(ab);
 
     MCMCSP_800::SECContinuousTargetInfo y;
     y.fName = "y";
@@ -184,12 +193,17 @@ TEST(SimulationReport, JsonCarriesTheResultsWithNullForMissing) {
     ASSERT_EQ(it.at("input_correlations").size(), 1u);
     EXPECT_EQ(it.at("input_correlations")[0].at("plan"), 0.5);
     EXPECT_EQ(it.at("input_correlations")[0].at("simulated"), 0.48);
+    EXPECT_EQ(it.at("input_correlations")[0].at("normal_scale"), 1.0);
+    EXPECT_EQ(it.at("input_correlations")[0].at("attainable_high"), 0.45);
+    EXPECT_EQ(it.at("input_correlations")[0].at("unreachable"), true);
     EXPECT_TRUE(it.at("contingency_table").is_null());
 
     std::ostringstream text;
     WriteTextReport(text, report);
     EXPECT_NE(text.str().find("std dev  missing"), std::string::npos) << text.str();
-    EXPECT_NE(text.str().find("a ~ b"), std::string::npos);
+    EXPECT_NE(text.str().find("[-0.300, 0.450]        1.0000      0.480  unreachable"),
+              std::string::npos)
+        << text.str();
 }
 
 } // namespace
