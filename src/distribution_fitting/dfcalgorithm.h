@@ -20,6 +20,7 @@
 #include "mcmath/mcaccumulators.h"
 #include "mcmath/mcfactortables.h"
 #include "mcthread/mcthread.h"
+#include "simulation_common/mcspdistfamily.h"
 
 #include <cstdint>
 #include <memory>
@@ -53,16 +54,7 @@ const DFCDebugOptimizerSwitches& GetDebugOptimizerSwitches();
 
 //! The descriptive statistics of one covariate from which its moment and start estimates
 //! follow. Every entry that was not computed is missing.
-struct DFCMomentInputs {
-    double fMean;      //!< m, weighted mean
-    double fVariance;  //!< v, weighted variance with divisor W - 1
-    double fVarianceW; //!< weighted variance with divisor W
-    double fMinimum;   //!< smallest value
-    double fMaximum;   //!< largest value
-    double fMode;      //!< mode of the moment-matched triangular distribution
-    double fGeoMean;   //!< exp(Σ w·ln x / W)
-    double fVarLog;    //!< Σ w·(ln x - mean of ln x)² / W
-};
+using DFCMomentInputs = MCSPSampleMoments;
 
 //! The moment or start estimate of distribution `type` (0 to 11 except Categorical) from the
 //! statistics `in`, in parameter-name order, into `params`. False, with `params` empty, when

@@ -9,9 +9,6 @@
 #include "mccommon/mcmv.h"
 #include "mcmath/mcdistfun.h"
 
-#include <boost/math/distributions/binomial.hpp>
-#include <boost/math/distributions/negative_binomial.hpp>
-#include <boost/math/distributions/poisson.hpp>
 #include <boost/math/special_functions/beta.hpp>
 #include <boost/math/special_functions/gamma.hpp>
 
@@ -70,56 +67,43 @@ double ChiSquareUpperTail(double x, double df) {
     return Finite(boost::math::gamma_q(0.5 * df, 0.5 * x, MCMathPolicy()));
 }
 
-//! The probabilities of the chi-square bins of one discrete candidate. The last bin of the
-//! NegBin and the Poisson holds their upper tail P(X ≥ c), which equals 1 minus the sum of the
-//! bins before it but is evaluated directly (the difference would lose every digit of a small
-//! tail, or even turn negative). Binomial bins above n are impossible values (probability 0).
+//! The probabilities of the chi-square bins of one discrete candidate, from its row of the
+//! family table. The last bin of the NegBin and the Poisson holds their upper tail P(X ≥ c),
+//! which equals 1 minus the sum of the bins before it but is evaluated directly (the
+//! difference would lose every digit of a small tail, or even turn negative). Binomial bins
+//! above n are impossible values (probability 0).
 class DFCBinProbabilities {
 public:
-    DFCBinProbabilities(DistType type, const std::vector<double>& params) : fType(type) {
-        fP0 = params.size() > 0 ? params[0] : kMissing;
-        fP1 = params.size() > 1 ? params[1] : kMissing;
+    DFCBinProbabilities(DistType type, const std::vector<double>& params)
+        : fType(type), fParams(params), fpFamily(MCSPFindDistFamily(type)) {
+        fbValid = fpFamily != nullptr && fpFamily->fbDiscrete && fpFamily->IsValid(fParams);
     }
 
     //! P_c of bin c; `last` marks the last bin. Missing or 0 when the parameters admit no
     //! probability.
     double operator()(std::int64_t c, bool last) const {
         const auto k = static_cast<double>(c);
-        switch (fType) {
-        case kDistBinomial: {
-            const double n = fP0;
+        if (fType == kDistBinomial) {
             // A single trial leaves no degree of freedom for the test.
-            if (!(n > 1.0) || !std::isfinite(n) || !(fP1 >= 0.0 && fP1 <= 1.0) || k > n) {
+            if (!fbValid || !(fParams[0] > 1.0) || k > fParams[0]) {
                 return 0.0;
             }
-            const boost::math::binomial_distribution<double, MCMathPolicy> dist(n, fP1);
-            return Finite(boost::math::pdf(dist, k));
-        }
-        case kDistNegbinomial: {
-            if (!(fP0 > 0.0) || !std::isfinite(fP0) || !(fP1 > 0.0 && fP1 <= 1.0)) {
-                return kMissing;
-            }
-            const boost::math::negative_binomial_distribution<double, MCMathPolicy> dist(fP0, fP1);
-            return Finite(last ? (c == 0 ? 1.0 : boost::math::cdf(complement(dist, k - 1.0)))
-                               : boost::math::pdf(dist, k));
-        }
-        case kDistPoisson: {
-            if (!(fP0 > 0.0) || !std::isfinite(fP0)) {
-                return kMissing;
-            }
-            const boost::math::poisson_distribution<double, MCMathPolicy> dist(fP0);
-            return Finite(last ? (c == 0 ? 1.0 : boost::math::cdf(complement(dist, k - 1.0)))
-                               : boost::math::pdf(dist, k));
-        }
-        default:
+        } else if (fType != kDistNegbinomial && fType != kDistPoisson) {
             return 0.0;
+        } else if (!fbValid) {
+            return kMissing;
+        } else if (last) {
+            return c == 0 ? 1.0 : fpFamily->fCcdf(fParams.data(), k - 1.0);
         }
+        const double lnP = fpFamily->fLogDensity(fParams.data(), k);
+        return MCMV::IsMissing(lnP) ? kMissing : Finite(std::exp(lnP));
     }
 
 private:
-    DistType fType; //!< candidate type
-    double fP0;     //!< n, r or λ
-    double fP1;     //!< the probability of Binomial and NegBin
+    DistType fType;                 //!< candidate type
+    std::vector<double> fParams;    //!< the candidate's parameters
+    const MCSPDistFamily* fpFamily; //!< its row of the family table
+    bool fbValid = false;           //!< the parameters are inside the family's domain
 };
 
 // ------------------------------------------------------------------------------------------
@@ -659,69 +643,22 @@ void DFCAlgorithm::ChooseEdfBestFit(int covariate) {
 }
 
 // ------------------------------------------------------------------------------------------
-// The fitted distribution functions
-//
-// LogNormal (a = geometric mean, b = sd of ln x): Φ(ln(x/a)/b) for x > 0. Normal: Φ((x-μ)/σ).
-// Triangular (min a, max b, mode c): (x-a)²/((b-a)(c-a)) on [a, c), (c-a)/(b-a) at c,
-// 1 - (b-x)²/((b-a)(b-c)) on (c, b]. Uniform: (x-a)/(b-a). Weibull (scale a, shape b,
-// location c): 1 - exp(-((x-c)/a)^b) for x > c. Gamma (shape α, rate β): P(α, βx). Beta:
-// I_x(a, b). Exponential (rate λ): 1 - exp(-λx). Each is 0 below and 1 above its support;
-// 1 - exp(-t) is evaluated as -expm1(-t), exact for small t.
+// The fitted distribution functions: the family table's F (Boost.Math), with the density and
+// its slope of the carried candidates below.
 
 DFCFittedCdf::DFCFittedCdf(DistType type, const std::vector<double>& params) : fType(type) {
-    std::size_t needed = 0;
-    switch (type) {
-    case kDistExponential:
-        needed = 1;
-        break;
-    case kDistLognormal:
-    case kDistNormal:
-    case kDistUniform:
-    case kDistGamma:
-    case kDistBeta:
-        needed = 2;
-        break;
-    case kDistTriangular:
-    case kDistWeibull:
-        needed = 3;
-        break;
-    default:
-        return;
-    }
-    if (params.size() < needed) {
+    fpFamily = MCSPFindDistFamily(type);
+    if (fpFamily == nullptr || fpFamily->fbDiscrete || params.size() < fpFamily->fNParams ||
+        !fpFamily->fHasDensity(params.data())) {
         return;
     }
     fP0 = params[0];
-    fP1 = needed > 1 ? params[1] : 0.0;
-    fP2 = needed > 2 ? params[2] : 0.0;
-    if (!std::isfinite(fP0) || !std::isfinite(fP1) || !std::isfinite(fP2)) {
-        return;
-    }
-    switch (type) {
-    case kDistLognormal:
-    case kDistGamma:
-    case kDistBeta:
-    case kDistWeibull:
-        fbValid = fP0 > 0.0 && fP1 > 0.0;
-        break;
-    case kDistNormal:
-        fbValid = fP1 > 0.0;
-        break;
-    case kDistUniform:
-        fbValid = fP0 < fP1;
-        break;
-    case kDistTriangular:
-        fbValid = fP0 < fP1 && fP0 <= fP2 && fP2 <= fP1;
-        break;
-    case kDistExponential:
-        fbValid = fP0 > 0.0;
-        break;
-    default:
-        break;
-    }
-    if (fbValid && type == kDistGamma) {
+    fP1 = fpFamily->fNParams > 1 ? params[1] : 0.0;
+    fP2 = fpFamily->fNParams > 2 ? params[2] : 0.0;
+    fbValid = true;
+    if (type == kDistGamma) {
         fLogNorm = boost::math::lgamma(fP0, MCMathPolicy()) - fP0 * std::log(fP1);
-    } else if (fbValid && type == kDistBeta) {
+    } else if (type == kDistBeta) {
         const double beta = boost::math::beta(fP0, fP1, MCMathPolicy());
         fLogNorm = beta > 0.0 && std::isfinite(beta)
                        ? std::log(beta)
@@ -733,42 +670,8 @@ double DFCFittedCdf::operator()(double x) const {
     if (!fbValid || MCMV::IsMissing(x)) {
         return kMissing;
     }
-    switch (fType) {
-    case kDistLognormal:
-        return x > 0.0 ? MCDistFun::CdfStdNorm(std::log(x / fP0) / fP1) : 0.0;
-    case kDistNormal:
-        return MCDistFun::CdfNorm(x, fP0, fP1);
-    case kDistTriangular: {
-        const double a = fP0;
-        const double b = fP1;
-        const double c = fP2;
-        if (x < a) {
-            return 0.0;
-        }
-        if (x > b) {
-            return 1.0;
-        }
-        if (x < c) {
-            return (x - a) * (x - a) / ((b - a) * (c - a));
-        }
-        if (x == c) {
-            return (c - a) / (b - a);
-        }
-        return 1.0 - (b - x) * (b - x) / ((b - a) * (b - c));
-    }
-    case kDistUniform:
-        return x < fP0 ? 0.0 : (x > fP1 ? 1.0 : (x - fP0) / (fP1 - fP0));
-    case kDistWeibull:
-        return x > fP2 ? -std::expm1(-std::pow((x - fP2) / fP0, fP1)) : 0.0;
-    case kDistGamma:
-        return x >= 0.0 ? MCDistFun::CdfGam(x, fP0, fP1) : 0.0;
-    case kDistBeta:
-        return x <= 0.0 ? 0.0 : (x >= 1.0 ? 1.0 : MCDistFun::CdfBeta(x, fP0, fP1));
-    case kDistExponential:
-        return x >= 0.0 ? -std::expm1(-x * fP0) : 0.0;
-    default:
-        return kMissing;
-    }
+    const double p[3] = {fP0, fP1, fP2};
+    return fpFamily->fCdf(p, x);
 }
 
 // ------------------------------------------------------------------------------------------
@@ -803,23 +706,8 @@ constexpr double kCarryTolerance = 1e-13;
 } // namespace
 
 double DFCFittedCdf::ExactTail(double x, bool upper) const {
-    switch (fType) {
-    case kDistGamma: {
-        const double y = fP1 * x;
-        return Finite(upper ? boost::math::gamma_q(fP0, y, MCMathPolicy())
-                            : boost::math::gamma_p(fP0, y, MCMathPolicy()));
-    }
-    case kDistBeta:
-        return Finite(upper ? boost::math::ibetac(fP0, fP1, x, MCMathPolicy())
-                            : boost::math::ibeta(fP0, fP1, x, MCMathPolicy()));
-    case kDistNormal:
-        return upper ? MCDistFun::CdfStdNorm(-((x - fP0) / fP1)) : (*this)(x);
-    case kDistLognormal:
-        return upper ? (x > 0.0 ? MCDistFun::CdfStdNorm(-(std::log(x / fP0) / fP1)) : 1.0)
-                     : (*this)(x);
-    default:
-        return kMissing;
-    }
+    const double p[3] = {fP0, fP1, fP2};
+    return upper ? fpFamily->fCcdf(p, x) : fpFamily->fCdf(p, x);
 }
 
 bool DFCFittedCdf::Density(double x, double& f, double& slope) const {

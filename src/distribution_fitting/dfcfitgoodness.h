@@ -16,6 +16,7 @@
 #include "mcmath/mccancelinfo.h"
 #include "mcthread/mcthread.h"
 #include "simulation_common/mcspconst.h"
+#include "simulation_common/mcspdistfamily.h"
 
 #include <cstddef>
 #include <vector>
@@ -77,12 +78,13 @@ private:
     bool CarryStretch(const double* x, std::size_t begin, std::size_t end, double* u,
                       double* work) const;
 
-    MCSPConst::DistType fType; //!< candidate type
-    double fP0 = 0.0;          //!< first parameter
-    double fP1 = 0.0;          //!< second parameter
-    double fP2 = 0.0;          //!< third parameter
-    bool fbValid = false;      //!< the parameters are usable
-    double fLogNorm = 0.0;     //!< ln Γ(α) - α·ln β (Gamma) or ln B(a, b) (Beta)
+    MCSPConst::DistType fType;                //!< candidate type
+    const MCSPDistFamily* fpFamily = nullptr; //!< its row of the family table
+    double fP0 = 0.0;                         //!< first parameter
+    double fP1 = 0.0;                         //!< second parameter
+    double fP2 = 0.0;                         //!< third parameter
+    bool fbValid = false;                     //!< the parameters are usable
+    double fLogNorm = 0.0; //!< ln Γ(α) - α·ln β (Gamma) or ln B(a, b) (Beta)
 };
 
 //! Running sums of the EDF statistics over sorted probabilities u_1 ≤ u_2 ≤ ..., so that they

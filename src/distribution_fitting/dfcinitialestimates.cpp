@@ -35,78 +35,14 @@ const DFCDebugOptimizerSwitches& GetDebugOptimizerSwitches() {
     return gDebugSwitches;
 }
 
-// Method-of-moments estimates (m mean, v variance with divisor W - 1, s² variance with
-// divisor W), each the solution of "model moments = sample moments":
-//   Binomial(n, p):     n·p = m, n·p·(1-p) = v     → n = m/(1 - v/m) rounded, at least 1;
-//                                                    p = m/n
-//   NegBin(r, p):       r·(1-p)/p = m, r·(1-p)/p² = v → r = m²/(v - m) when v > m (else 1),
-//                                                    p = r/(m + r); counts failures (type 2)
-//   LogNormal(a, b):    a = exp(mean of ln x), b = sd of ln x (divisor W)
-//   Normal:             mean m, sd s
-//   Poisson:            λ = m
-//   Triangular, Uniform: the extremes (and the moment-matched mode)
-//   Gamma(α, β), rate β: α/β = m, α/β² = v     → α = m²/v, β = m/v
-//   Beta(a, b):         t = m(1-m)/v - 1        → a = m·t, b = (1-m)·t
-//   Exponential:        rate 1/m
-//   Weibull(a, b, c):   no closed form; (1, 1, 0) starts the likelihood root search.
-// Johnson, Kotz and Balakrishnan, "Continuous Univariate Distributions" (1994/1995) and
-// "Univariate Discrete Distributions" (2005), the chapters of each family.
+// Method-of-moments estimates, each the solution of "model moments = sample moments", are the
+// family table's (mcspdistfamily.cpp, one per family with its derivation).
 bool ComputeMomentEstimate(DistType type, const DFCMomentInputs& in, bool threeParamWeibull,
                            std::vector<double>& params) {
     params.clear();
-    const double m = in.fMean;
-    const double v = in.fVariance;
+    const MCSPDistFamily* family = MCSPFindDistFamily(type);
     std::vector<double> p;
-    switch (type) {
-    case kDistBinomial: {
-        double n = std::floor(m / (1.0 - v / m) + 0.5);
-        if (n < 1.0) {
-            n = 1.0;
-        }
-        p = {n, m / n};
-        break;
-    }
-    case kDistNegbinomial: {
-        const double r = v > m ? m * m / (v - m) : 1.0;
-        p = {r, r / (m + r), 2.0};
-        break;
-    }
-    case kDistLognormal:
-        p = {in.fGeoMean, std::sqrt(in.fVarLog)};
-        break;
-    case kDistNormal:
-        p = {m, std::sqrt(in.fVarianceW)};
-        break;
-    case kDistPoisson:
-        p = {m};
-        break;
-    case kDistTriangular:
-        p = {in.fMinimum, in.fMaximum, in.fMode};
-        break;
-    case kDistUniform:
-        p = {in.fMinimum, in.fMaximum};
-        break;
-    case kDistWeibull:
-        p = {1.0, 1.0, threeParamWeibull ? in.fMinimum - 1e-5 : 0.0};
-        break;
-    case kDistGamma:
-        if (!(v > 0.0)) {
-            return false;
-        }
-        p = {m * m / v, m / v};
-        break;
-    case kDistBeta: {
-        if (!(v > 0.0)) {
-            return false;
-        }
-        const double t = (1.0 - m) * m / v - 1.0;
-        p = {m * t, (1.0 - m) * t};
-        break;
-    }
-    case kDistExponential:
-        p = {1.0 / m};
-        break;
-    default:
+    if (family == nullptr || !family->fMomentEstimate(in, threeParamWeibull, p)) {
         return false;
     }
     // A statistic that does not exist (the variance of less than two weight units, say) must

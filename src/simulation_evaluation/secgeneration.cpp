@@ -4,9 +4,12 @@
 #include "mcmath/mcdistfun.h"
 #include "mcmath/mcmathfun.h"
 #include "mcmath/mcpower.h"
+#include "simulation_common/mcspdistfamily.h"
 
 #include <algorithm>
 #include <cmath>
+#include <functional>
+#include <limits>
 
 namespace MCMCSP_800 {
 
@@ -18,106 +21,6 @@ namespace {
 
 bool IsFinite(double x) {
     return std::isfinite(x);
-}
-
-bool IsProbability(double p) {
-    return p >= 0.0 && p <= 1.0;
-}
-
-//! Γ(x) through ln Γ of the math services; missing where ln Γ is.
-double GammaFunction(double x) {
-    const double lnGamma = MCDistFun::norvanednlgam(x);
-    return MCMV::IsMissing(lnGamma) ? MCMV::Missing() : std::exp(lnGamma);
-}
-
-//! Poisson distribution function at a whole x ≥ 0: P(X ≤ x) = Q(x + 1, λ) = 1 − P(x + 1, λ),
-//! the regularised incomplete gamma of shape x + 1 at λ with unit rate.
-double PoissonCdf(double lambda, double x) {
-    const double lower = MCDistFun::CdfGam(lambda, x + 1.0, 1.0);
-    return MCMV::IsMissing(lower) ? MCMV::Missing() : 1.0 - lower;
-}
-
-//! Negative binomial distribution function of the failures before the r-th success:
-//! P(X ≤ x) = I_p(r, x + 1).
-double NegBinCdf(double r, double p, double x) {
-    return MCDistFun::CdfBeta(p, r, x + 1.0);
-}
-
-//! Exact inverse of a discrete distribution function F on 0, 1, 2, … by a search on whole
-//! numbers: the k with F(k − 1) ≤ u < F(k), given a `lo` ≥ −1 with F(lo) ≤ u (F(−1) = 0).
-//! Upper bracket by doubling, then bisection; about 2·log2(k) evaluations of F. Missing when
-//! F is missing on the way or no k below 2^52 qualifies (u ≥ 1).
-//!
-//! Why whole numbers: F's continuous extension F(x) (the incomplete gamma or beta in x + 1)
-//! crosses u at some x* in (k − 1, k]; rounding a root found on the reals, floor(x* + 0.5),
-//! gives k − 1 whenever x* lies in the lower half of that interval, which moves probability
-//! from every value to its predecessor. The draw must be k itself, the inverse by inversion.
-template <class Cdf> double IntegerInverse(const Cdf& cdf, double lo, double u) {
-    constexpr double kLimit = 4503599627370496.0; // 2^52: whole numbers stay exact
-    double hi = std::max(2.0 * lo + 1.0, 1.0);
-    for (;;) {
-        const double f = cdf(hi);
-        if (MCMV::IsMissing(f)) {
-            return MCMV::Missing();
-        }
-        if (f > u) {
-            break;
-        }
-        lo = hi;
-        hi = 2.0 * hi + 1.0;
-        if (hi > kLimit) {
-            return MCMV::Missing();
-        }
-    }
-    // Invariant: F(lo) ≤ u < F(hi).
-    while (hi - lo > 1.0) {
-        const double mid = std::floor(0.5 * (lo + hi));
-        const double f = cdf(mid);
-        if (MCMV::IsMissing(f)) {
-            return MCMV::Missing();
-        }
-        if (f > u) {
-            hi = mid;
-        } else {
-            lo = mid;
-        }
-    }
-    return hi;
-}
-
-//! The prepared exact inverse: a lookup in the table 0, F(0), F(1), …, F(K − 1) while u lies
-//! below its last entry, the search on F beyond it. Both give the k with F(k − 1) ≤ u < F(k).
-template <class Cdf>
-double TableInverse(const std::vector<double>& table, const Cdf& cdf, double u) {
-    if (u < table.back()) {
-        return static_cast<double>(SECDrawCell(table, u));
-    }
-    return IntegerInverse(cdf, static_cast<double>(table.size()) - 2.0, u);
-}
-
-//! Fills `table` with 0, F(0), F(1), … until F reaches 1 or the table holds kMaxInverseTable
-//! values of F. False when F is missing somewhere.
-template <class Cdf> bool BuildInverseTable(const Cdf& cdf, std::vector<double>& table) {
-    table.assign(1, 0.0);
-    for (int k = 0; k < SECGenerationConst::kMaxInverseTable; ++k) {
-        const double f = cdf(static_cast<double>(k));
-        if (MCMV::IsMissing(f)) {
-            table.clear();
-            return false;
-        }
-        table.push_back(f);
-        if (f >= 1.0) {
-            break;
-        }
-    }
-    return true;
-}
-
-//! The normal approximation of a discrete input with mean m ≥ 20: the nearest whole number to
-//! m + s·z, that is floor(m + s·z + 0.5). The continuity correction (+0.5) keeps the mean at m;
-//! a plain floor would shift every value down by half a unit on average.
-double NormalApproximation(const SECInputGenerator& gen, double z) {
-    return std::floor(z * gen.fStdDev + gen.fMean + 0.5);
 }
 
 //! Position of a value inside cell i of a cumulative table: (u − t_i)/(t_(i+1) − t_i) ∈ [0, 1).
@@ -300,189 +203,79 @@ void BuildScoreTable(SECInputGenerator& gen) {
     });
 }
 
-//! m, s, the range, the tables and the validity of each type. `p` is the stored vector, whose
-//! length SECBuildStoredParams has checked (it is checked again here for callers that build
-//! vectors by hand).
-bool PrepareByType(DistType type, const std::vector<double>& params, SECInputGenerator& gen) {
+//! The prepared exact inverse of a count input: F(k) for the whole numbers k around the centre
+//! of the distribution, from the (kCountTailMass)-quantile up to the complementary one and at
+//! most kMaxCountTable of them. A u inside the table is inverted by a binary search (about
+//! log2 of the table's length comparisons); the rare u beyond it by the family's quantile.
+void BuildCountTable(const MCSPDistFamily& family, SECInputGenerator& gen) {
+    const double* p = gen.fvParams.data();
+    gen.fvCountTable.clear();
+    const double first = family.fQuantile(p, SECGenerationConst::kCountTailMass);
+    const double last = family.fQuantileComplement(p, SECGenerationConst::kCountTailMass);
+    if (MCMV::IsMissing(first) || MCMV::IsMissing(last)) {
+        return; // every draw goes to the quantile
+    }
+    const double below = family.fCdf(p, first - 1.0);
+    if (MCMV::IsMissing(below)) {
+        return;
+    }
+    gen.fCountBase = first;
+    gen.fCountBelow = below;
+    const double count =
+        std::min(last - first + 1.0, static_cast<double>(SECGenerationConst::kMaxCountTable));
+    gen.fvCountTable.reserve(static_cast<std::size_t>(count));
+    for (double k = 0.0; k < count; k += 1.0) {
+        const double f = family.fCdf(p, first + k);
+        if (MCMV::IsMissing(f)) {
+            gen.fvCountTable.clear();
+            return;
+        }
+        gen.fvCountTable.push_back(f);
+    }
+}
+
+//! m, s, the range and the validity of every parametric family from its row of the family
+//! table; the cumulative tables, prepared quantiles and sensitivity flags the generation adds.
+bool PrepareFamily(const MCSPDistFamily& family, SECInputGenerator& gen) {
+    if (!family.IsValid(gen.fvParams)) {
+        return false;
+    }
+    const double* p = gen.fvParams.data();
+    gen.fMean = family.fMean(p);
+    const double variance = family.fVariance(p);
+    gen.fStdDev = MCMV::IsMissing(variance) ? variance : std::sqrt(variance);
+    family.fSupport(p, gen.fLower, gen.fUpper);
+    // m and s may overflow (a LogNormal of large b, a Weibull of tiny shape); the draws do not
+    // need them.
+    gen.fbHasSensitivity = !family.fbDiscrete;
+    switch (family.fType) {
+    case MCSPConst::kDistBernoulli:
+        gen.fvCumTable = {0.0, 1.0 - p[0], 1.0};
+        return true;
+    case MCSPConst::kDistBinomial:
+    case MCSPConst::kDistNegbinomial:
+    case MCSPConst::kDistPoisson:
+        BuildCountTable(family, gen);
+        return true;
+    case MCSPConst::kDistGamma:
+        gen.fQuantile = MCMath_800::MCGammaQuantile(p[0], p[1]);
+        return std::get<MCMath_800::MCGammaQuantile>(gen.fQuantile).IsValid();
+    case MCSPConst::kDistBeta:
+        gen.fQuantile = MCMath_800::MCBetaQuantile(p[0], p[1]);
+        return std::get<MCMath_800::MCBetaQuantile>(gen.fQuantile).IsValid();
+    default:
+        return true;
+    }
+}
+
+//! The tabled types, Empirical and UserRanges: m, s, the range and the cumulative table.
+bool PrepareTabled(DistType type, const std::vector<double>& params, SECInputGenerator& gen) {
     const double* p = params.data();
     const std::size_t n = params.size();
-    const double missing = MCMV::Missing();
-    const bool allFinite = std::all_of(params.begin(), params.end(), IsFinite);
-    if (!allFinite) {
+    if (!std::all_of(params.begin(), params.end(), IsFinite)) {
         return false;
     }
     switch (type) {
-    case MCSPConst::kDistBinomial: {
-        if (n != 2 || p[0] < 0.0 || !IsProbability(p[1])) {
-            return false;
-        }
-        const double trials = p[0];
-        const double prob = p[1];
-        gen.fMean = trials * prob;
-        gen.fStdDev = std::sqrt(trials * prob * (1.0 - prob));
-        gen.fLower = 0.0;
-        gen.fUpper = trials;
-        gen.fbExactDiscrete = gen.fMean < SECGenerationConst::kDiscreteThreshold;
-        if (trials == 1.0) {
-            gen.fvCumTable = {0.0, 1.0 - prob, 1.0};
-        } else if (gen.fbExactDiscrete) {
-            // 0, F(0), …, F(N − 1), 1.0 with N = n rounded. The table stops early once F has
-            // reached 1 in double precision: the cells beyond have width 0 and are never
-            // chosen, so the draws are the same and a huge n with a small mean costs nothing.
-            // The normal approximation (m ≥ 20) does not read the table, which is not built.
-            const double nRounded = std::floor(trials + 0.5);
-            gen.fvCumTable.assign(1, 0.0);
-            for (double k = 0.0; k < nRounded; k += 1.0) {
-                int err = 0;
-                const double f = MCDistFun::CdfBin(k, trials, prob, err);
-                if (err != 0 || MCMV::IsMissing(f)) {
-                    return false;
-                }
-                gen.fvCumTable.push_back(f);
-                if (f >= 1.0) {
-                    break;
-                }
-            }
-            gen.fvCumTable.push_back(1.0);
-        }
-        return true;
-    }
-    case MCSPConst::kDistNegbinomial: {
-        if (n != 3 || !(p[0] > 0.0) || !(p[1] > 0.0 && p[1] <= 1.0)) {
-            return false;
-        }
-        const double r = p[0];
-        const double prob = p[1];
-        gen.fMean = r * (1.0 - prob) / prob;
-        gen.fStdDev = std::sqrt(r * (1.0 - prob)) / prob;
-        gen.fLower = p[2] == 1.0 ? r : 0.0;
-        gen.fUpper = missing;
-        gen.fbExactDiscrete = gen.fMean < SECGenerationConst::kDiscreteThreshold;
-        if (gen.fbExactDiscrete) {
-            return BuildInverseTable([r, prob](double x) { return NegBinCdf(r, prob, x); },
-                                     gen.fvInverseTable);
-        }
-        return true;
-    }
-    case MCSPConst::kDistLognormal:
-        if (n != 2 || !(p[0] > 0.0) || p[1] < 0.0) {
-            return false;
-        }
-        gen.fMean = p[0] * std::exp(0.5 * p[1] * p[1]);
-        gen.fStdDev = p[0] * std::sqrt(std::expm1(p[1] * p[1]) * std::exp(p[1] * p[1]));
-        gen.fLower = 0.0;
-        gen.fUpper = missing;
-        gen.fbHasSensitivity = true;
-        return true; // s may overflow for a large b; the draws do not need it
-    case MCSPConst::kDistNormal:
-        if (n != 2 || p[1] < 0.0) {
-            return false;
-        }
-        gen.fMean = p[0];
-        gen.fStdDev = p[1];
-        gen.fLower = missing;
-        gen.fUpper = missing;
-        gen.fbHasSensitivity = true;
-        return true;
-    case MCSPConst::kDistPoisson: {
-        if (n != 1 || !(p[0] > 0.0)) {
-            return false;
-        }
-        const double lambda = p[0];
-        gen.fMean = lambda;
-        gen.fStdDev = std::sqrt(lambda);
-        gen.fLower = 0.0;
-        gen.fUpper = missing;
-        gen.fbExactDiscrete = gen.fMean < SECGenerationConst::kDiscreteThreshold;
-        if (gen.fbExactDiscrete) {
-            return BuildInverseTable([lambda](double x) { return PoissonCdf(lambda, x); },
-                                     gen.fvInverseTable);
-        }
-        return true;
-    }
-    case MCSPConst::kDistTriangular: {
-        const double a = p[0];
-        const double b = n == 3 ? p[1] : 0.0;
-        const double c = n == 3 ? p[2] : 0.0;
-        if (n != 3 || !(a < b) || c < a || c > b) {
-            return false;
-        }
-        gen.fMean = (a + b + c) / 3.0;
-        gen.fStdDev = std::sqrt((a * a + b * b + c * c - a * b - a * c - b * c) / 18.0);
-        gen.fLower = a;
-        gen.fUpper = b;
-        gen.fbHasSensitivity = true;
-        return true;
-    }
-    case MCSPConst::kDistUniform:
-        if (n != 2 || p[0] > p[1]) {
-            return false;
-        }
-        gen.fMean = 0.5 * (p[0] + p[1]);
-        gen.fStdDev = (p[1] - p[0]) / std::sqrt(12.0);
-        gen.fLower = p[0];
-        gen.fUpper = p[1];
-        gen.fbHasSensitivity = true;
-        return true;
-    case MCSPConst::kDistWeibull: {
-        if (n != 3 || !(p[0] > 0.0) || !(p[1] > 0.0)) {
-            return false;
-        }
-        const double g1 = GammaFunction(1.0 + 1.0 / p[1]);
-        const double g2 = GammaFunction(1.0 + 2.0 / p[1]);
-        gen.fMean = p[2] + p[0] * g1;
-        gen.fStdDev = p[0] * std::sqrt(g2 - g1 * g1);
-        gen.fLower = p[2];
-        gen.fUpper = missing;
-        gen.fbHasSensitivity = true;
-        return true; // m and s may overflow for a tiny shape b; the draws do not need them
-    }
-    case MCSPConst::kDistGamma: {
-        if (n != 2 || !(p[0] > 0.0) || !(p[1] > 0.0)) {
-            return false;
-        }
-        // Shape k, rate β: mean k/β, standard deviation √k/β.
-        gen.fMean = p[0] / p[1];
-        gen.fStdDev = std::sqrt(p[0]) / p[1];
-        gen.fLower = 0.0;
-        gen.fUpper = missing;
-        gen.fbHasSensitivity = true;
-        gen.fQuantile = MCMath_800::MCGammaQuantile(p[0], p[1]);
-        return std::get<MCMath_800::MCGammaQuantile>(gen.fQuantile).IsValid();
-    }
-    case MCSPConst::kDistBeta: {
-        if (n != 2 || !(p[0] > 0.0) || !(p[1] > 0.0)) {
-            return false;
-        }
-        const double sum = p[0] + p[1];
-        gen.fMean = p[0] / sum;
-        gen.fStdDev = std::sqrt(p[0] * p[1] / (sum * sum * (sum + 1.0)));
-        gen.fLower = 0.0;
-        gen.fUpper = 1.0;
-        gen.fbHasSensitivity = true;
-        gen.fQuantile = MCMath_800::MCBetaQuantile(p[0], p[1]);
-        return std::get<MCMath_800::MCBetaQuantile>(gen.fQuantile).IsValid();
-    }
-    case MCSPConst::kDistExponential:
-        if (n != 1 || !(p[0] > 0.0)) {
-            return false;
-        }
-        gen.fMean = 1.0 / p[0];
-        gen.fStdDev = 1.0 / p[0];
-        gen.fLower = 0.0;
-        gen.fUpper = missing;
-        gen.fbHasSensitivity = true;
-        return true;
-    case MCSPConst::kDistBernoulli:
-        if (n != 1 || !IsProbability(p[0])) {
-            return false;
-        }
-        gen.fMean = p[0];
-        gen.fStdDev = std::sqrt(p[0] * (1.0 - p[0]));
-        gen.fLower = 0.0;
-        gen.fUpper = 1.0;
-        gen.fvCumTable = {0.0, 1.0 - p[0], 1.0};
-        return true;
     case MCSPConst::kDistEmpirical: {
         if (n < 5 || p[0] > p[1] || p[2] < 0.0) {
             return false;
@@ -523,8 +316,8 @@ bool PrepareByType(DistType type, const std::vector<double>& params, SECInputGen
         if (!SECBuildCumulativeTable(probs, gen.fvCumTable)) {
             return false;
         }
-        gen.fMean = missing;
-        gen.fStdDev = missing;
+        gen.fMean = MCMV::Missing();
+        gen.fStdDev = MCMV::Missing();
         gen.fLower = *std::min_element(p, p + k);
         gen.fUpper = *std::max_element(p + k, p + 2 * k);
         return true;
@@ -619,18 +412,21 @@ bool SECBuildStoredParams(const DistInfoElem& dist, bool continuousLevel,
 bool SECPrepareGenerator(DistType type, const std::vector<double>& params, SECInputGenerator& gen) {
     gen.fDistType = type;
     gen.fvParams = params;
+    gen.fpFamily = MCSPFindDistFamily(type);
     gen.fMean = MCMV::Missing();
     gen.fStdDev = MCMV::Missing();
     gen.fLower = MCMV::Missing();
     gen.fUpper = MCMV::Missing();
     gen.fvCumTable.clear();
-    gen.fvInverseTable.clear();
+    gen.fvCountTable.clear();
+    gen.fCountBase = 0.0;
+    gen.fCountBelow = 0.0;
     gen.fbContinuousEmpirical = false;
-    gen.fbExactDiscrete = false;
     gen.fbHasSensitivity = false;
     gen.fQuantile = std::monostate();
     gen.fScoreTable.Clear();
-    gen.fbValid = !params.empty() && PrepareByType(type, params, gen);
+    gen.fbValid = !params.empty() && (gen.fpFamily != nullptr ? PrepareFamily(*gen.fpFamily, gen)
+                                                              : PrepareTabled(type, params, gen));
     if (gen.fbValid) {
         BuildScoreTable(gen);
     }
@@ -660,6 +456,74 @@ bool SECBuildCumulativeTable(const std::vector<double>& probs, std::vector<doubl
     return true;
 }
 
+bool SECDiscreteSupport(const SECInputGenerator& gen, std::size_t maxPoints,
+                        std::vector<double>& values, std::vector<double>& cdf) {
+    values.clear();
+    cdf.clear();
+    if (!gen.fbValid) {
+        return false;
+    }
+    const double* p = gen.fvParams.data();
+    // Two-point and tabled supports: 0, 1, …, K − 1 with the cumulative table's entries.
+    const auto fromTable = [&](const std::vector<double>& table) {
+        for (std::size_t k = 1; k < table.size(); ++k) {
+            if (table[k] > table[k - 1]) {
+                values.push_back(static_cast<double>(k - 1));
+                cdf.push_back(table[k]);
+            }
+        }
+    };
+    switch (gen.fDistType) {
+    case MCSPConst::kDistBernoulli:
+        fromTable(gen.fvCumTable);
+        break;
+    case MCSPConst::kDistEmpirical:
+        if (gen.fbContinuousEmpirical) {
+            return false;
+        }
+        fromTable(gen.fvCumTable);
+        break;
+    case MCSPConst::kDistBinomial:
+    case MCSPConst::kDistNegbinomial:
+    case MCSPConst::kDistPoisson: {
+        // From the first whole number whose probability does not underflow, upwards until F
+        // reaches 1; a support wider than maxPoints is refused as soon as it is seen to be.
+        const MCSPDistFamily& family = *gen.fpFamily;
+        const double first = family.fQuantile(p, std::numeric_limits<double>::min());
+        double previous = MCMV::IsMissing(first) ? first : family.fCdf(p, first - 1.0);
+        if (MCMV::IsMissing(previous)) {
+            return false;
+        }
+        for (double k = first; previous < 1.0 && values.size() <= maxPoints; k += 1.0) {
+            const double f = family.fCdf(p, k);
+            if (MCMV::IsMissing(f)) {
+                values.clear();
+                cdf.clear();
+                return false;
+            }
+            if (f > previous) {
+                values.push_back(k);
+                cdf.push_back(f);
+                previous = f;
+            }
+            if (!MCMV::IsMissing(gen.fUpper) && k >= gen.fUpper) {
+                break;
+            }
+        }
+        break;
+    }
+    default:
+        return false;
+    }
+    if (values.empty() || values.size() > maxPoints) {
+        values.clear();
+        cdf.clear();
+        return false;
+    }
+    cdf.back() = 1.0;
+    return true;
+}
+
 int SECDrawCell(const std::vector<double>& table, double u) {
     if (table.size() < 2) {
         return -1;
@@ -669,19 +533,25 @@ int SECDrawCell(const std::vector<double>& table, double u) {
            1;
 }
 
-double SECPoissonInverse(double lambda, double u) {
-    if (!(lambda > 0.0) || !IsFinite(lambda) || !(u >= 0.0 && u < 1.0)) {
-        return MCMV::Missing();
+namespace {
+
+//! The exact inverse of a count input at u = Φ(z): the k with F(k − 1) ≤ u < F(k), from the
+//! prepared table where u falls inside it, else from the family's quantile, taken from the
+//! upper-tail probability Φ(−z) above the median so that the upper tail keeps its relative
+//! accuracy. Every value lies in the support: no approximation is involved at any mean.
+double CountInverse(const SECInputGenerator& gen, double z) {
+    const double u = MCDistFun::CdfStdNorm(z);
+    const std::vector<double>& table = gen.fvCountTable;
+    if (!table.empty() && u >= gen.fCountBelow && u < table.back()) {
+        const auto cell = std::upper_bound(table.begin(), table.end(), u) - table.begin();
+        return gen.fCountBase + static_cast<double>(cell);
     }
-    return IntegerInverse([lambda](double x) { return PoissonCdf(lambda, x); }, -1.0, u);
+    const double* p = gen.fvParams.data();
+    return z <= 0.0 ? gen.fpFamily->fQuantile(p, u)
+                    : gen.fpFamily->fQuantileComplement(p, MCDistFun::CdfStdNorm(-z));
 }
 
-double SECNegBinInverse(double r, double p, double u) {
-    if (!(r > 0.0) || !IsFinite(r) || !(p > 0.0 && p <= 1.0) || !(u >= 0.0 && u < 1.0)) {
-        return MCMV::Missing();
-    }
-    return IntegerInverse([r, p](double x) { return NegBinCdf(r, p, x); }, -1.0, u);
-}
+} // namespace
 
 namespace {
 
@@ -696,26 +566,10 @@ double ExactTransform(const SECInputGenerator& gen, double z) {
     }
     const double* p = gen.fvParams.data();
     switch (gen.fDistType) {
-    case MCSPConst::kDistBinomial: {
-        if (p[0] == 1.0) {
-            return MCDistFun::CdfStdNorm(z) >= 1.0 - p[1] ? 1.0 : 0.0;
-        }
-        if (gen.fbExactDiscrete) {
-            return static_cast<double>(SECDrawCell(gen.fvCumTable, MCDistFun::CdfStdNorm(z)));
-        }
-        return NormalApproximation(gen, z);
-    }
-    case MCSPConst::kDistNegbinomial: {
-        const double r = p[0];
-        const double prob = p[1];
-        const double failures =
-            gen.fbExactDiscrete
-                ? TableInverse(
-                      gen.fvInverseTable, [r, prob](double x) { return NegBinCdf(r, prob, x); },
-                      MCDistFun::CdfStdNorm(z))
-                : NormalApproximation(gen, z);
-        return p[2] == 1.0 ? failures + r : failures;
-    }
+    case MCSPConst::kDistBinomial:
+    case MCSPConst::kDistNegbinomial:
+    case MCSPConst::kDistPoisson:
+        return CountInverse(gen, z);
     case MCSPConst::kDistLognormal: {
         const double bz = p[1] * z;
         if (bz > MCMath_800::MCPower::gMachineMaxExp) {
@@ -725,15 +579,6 @@ double ExactTransform(const SECInputGenerator& gen, double z) {
     }
     case MCSPConst::kDistNormal:
         return p[0] + p[1] * z;
-    case MCSPConst::kDistPoisson: {
-        if (!gen.fbExactDiscrete) {
-            return NormalApproximation(gen, z);
-        }
-        const double lambda = p[0];
-        return TableInverse(
-            gen.fvInverseTable, [lambda](double x) { return PoissonCdf(lambda, x); },
-            MCDistFun::CdfStdNorm(z));
-    }
     case MCSPConst::kDistTriangular: {
         // Inverse of the triangular distribution function on [a, b] with mode c.
         const double a = p[0];

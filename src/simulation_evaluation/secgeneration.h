@@ -15,7 +15,8 @@
 // the Triangular). A draw inside the table costs a polynomial and at most one exp instead of
 // an erfc and a quantile; beyond |z| = 8 and in any interval the check left out the transform
 // is computed exactly. Normal and LogNormal are closed forms in z and need no table; the
-// discrete types, Empirical and UserRanges keep their exact cell search.
+// count types are inverted exactly through a prepared table of their distribution function
+// (any mean; no normal approximation), Empirical and UserRanges by their exact cell search.
 //
 // Stored parameter vectors, by type (MCSPConst::DistType), in the order of the type's
 // parameter names:
@@ -31,6 +32,7 @@
 
 #include "mcmath/mcquantile.h"
 #include "simulation_common/mcspconst.h"
+#include "simulation_common/mcspdistfamily.h"
 #include "simulation_common/simulatespecs.h"
 
 #include <string>
@@ -41,18 +43,13 @@ namespace MCMCSP_800 {
 
 //! Constants of the generation model.
 struct SECGenerationConst {
-    //! Binomial, NegBin and Poisson inputs with a mean below this are inverted exactly, the
-    //! others through the normal approximation.
-    static constexpr double kDiscreteThreshold = 20.0;
-    //! Transformed pairs drawn to estimate one NORTA correlation g(r).
-    static constexpr int kNortaSampleSize = 1000;
-    //! Stop of the search for a normal correlation: |g(r) − ρ| or the interval below it.
-    static constexpr double kNortaTolerance = 0.01;
     //! Attempts per case before truncation by rejection gives up (code 390014).
     static constexpr int kMaxAttempts = 1000;
-    //! Longest table of a discrete distribution function prepared per input; values beyond
-    //! it are found by a search on the distribution function.
-    static constexpr int kMaxInverseTable = 4096;
+    //! Longest table of a count distribution function prepared per input (8 bytes an entry).
+    static constexpr int kMaxCountTable = 1 << 16;
+    //! The count table runs from the quantile of this probability to the complementary one:
+    //! a draw beyond it (about 2 in 10^12) is inverted by the family's quantile.
+    static constexpr double kCountTailMass = 1e-12;
 };
 
 //! One input of the correlated set, prepared for drawing: everything SECTransform needs.
@@ -61,19 +58,21 @@ struct SECInputGenerator {
     std::string fName;                                       //!< input (variable) name
     MCSPConst::DistType fDistType = MCSPConst::kDistUnknown; //!< distribution type
     std::vector<double> fvParams;                            //!< stored parameter vector
-    double fMean = 0.0;   //!< m: the input's mean (the threshold of the discrete types)
-    double fStdDev = 0.0; //!< s: the input's standard deviation (tornado delta, normal approx.)
+    double fMean = 0.0;                                      //!< m: the input's mean
+    double fStdDev = 0.0; //!< s: the input's standard deviation (tornado delta)
     double fLower = 0.0;  //!< lower end of the natural range; missing when unbounded
     double fUpper = 0.0;  //!< upper end of the natural range; missing when unbounded
     //! Cumulative table 0, p0, p0 + p1, …, 1.0 of the types that have one; empty otherwise.
     std::vector<double> fvCumTable;
-    //! Poisson and NegBin below the discrete threshold: 0, F(0), F(1), … up to F = 1 or
-    //! kMaxInverseTable entries, the prepared exact inverse.
-    std::vector<double> fvInverseTable;
+    //! Binomial, NegBin and Poisson: F(k) for k = fCountBase, fCountBase + 1, … (see
+    //! kCountTailMass), the prepared exact inverse; empty when it could not be built.
+    std::vector<double> fvCountTable;
+    double fCountBase = 0.0;  //!< the first whole number of fvCountTable
+    double fCountBelow = 0.0; //!< F(fCountBase − 1), the mass below the table
+    //! The family's row in the distribution-family table; null for Empirical and UserRanges.
+    const MCSPDistFamily* fpFamily = nullptr;
     //! Empirical: values spread over each bin (continuous level) rather than the bin index.
     bool fbContinuousEmpirical = false;
-    //! Binomial, NegBin, Poisson with m < 20: inverted exactly rather than approximated.
-    bool fbExactDiscrete = false;
     //! The type carries the tornado delta and the contribution-to-variance flag.
     bool fbHasSensitivity = false;
     //! Parameters usable; an unusable input draws missing values (every case is rejected).
@@ -125,16 +124,17 @@ double SECTransform(const SECInputGenerator& gen, double z);
 //! and checked against.
 double SECTransformExact(const SECInputGenerator& gen, double z);
 
+//! The support of a discrete input (Binomial, NegBin, Poisson, Bernoulli, Empirical of a
+//! discrete level) as ascending values x_0 < x_1 < … and their distribution function
+//! cdf[k] = P(X ≤ x_k), the last entry 1.0. Points whose probability underflows to 0 at the
+//! ends are left out. False, with both vectors cleared, for a continuous or unusable input, or
+//! when more than `maxPoints` points carry probability (a wide count such as Poisson(10^6):
+//! the caller then treats the input as continuous).
+bool SECDiscreteSupport(const SECInputGenerator& gen, std::size_t maxPoints,
+                        std::vector<double>& values, std::vector<double>& cdf);
+
 //! The cell of a cumulative table that holds u ∈ [0, 1): MCMathFun::BinSearch − 1. −1 for an
 //! empty table.
 int SECDrawCell(const std::vector<double>& table, double u);
-
-//! The exact discrete inverse: the k ≥ 0 with F(k − 1) ≤ u < F(k) for the Poisson with mean
-//! λ, F(x) = 1 − P(x + 1, λ) (P the regularised lower incomplete gamma). Missing for an
-//! unusable λ or u.
-double SECPoissonInverse(double lambda, double u);
-//! The same for the negative binomial count of failures before the r-th success,
-//! F(x) = I_p(r, x + 1).
-double SECNegBinInverse(double r, double p, double u);
 
 } // namespace MCMCSP_800

@@ -1,5 +1,5 @@
 // Input generation: draws of every type against Boost.Math's distribution functions (called
-// directly), the exact discrete inverse, stored parameters, moments and ranges, unusable plans,
+// directly), count inputs at every mean, stored parameters, moments and ranges, unusable plans,
 // and the simulator's truncation, categories, contingency tables, sensitivity and seeding.
 // Fixed seeds; each goodness-of-fit check fails with probability at most 1e-6 for a correct
 // generator: Kolmogorov-Smirnov by the DKW inequality P(sup|F_n − F| > ε) ≤ 2·exp(−2nε²)
@@ -10,6 +10,7 @@
 #include "component/mcspassert.h"
 #include "component/mcspcomponent.h"
 #include "data/simgen_plans.h"
+#include "distribution_fitting/dfcfitgoodness.h"
 #include "mccommon/mcmv.h"
 #include "mcmath/mcrandom.h"
 #include "mctolerance.h"
@@ -35,8 +36,6 @@ using simgen::TestPlan;
 namespace {
 
 namespace bm = boost::math;
-using RoundUp =
-    bm::policies::policy<bm::policies::discrete_quantile<bm::policies::integer_round_up>>;
 
 constexpr double kAlpha = 1e-6; // false-failure rate of one goodness-of-fit check
 constexpr int kDraws = 100000;
@@ -173,8 +172,7 @@ TEST_P(GoodnessOfFit, DrawsFollowTheirDistribution) {
 }
 
 // clang-format off
-// The references: Boost's distribution functions; for the normal approximation of a discrete
-// input with mean ≥ 20, round(m + s·z), P(v ≤ k) = Φ((k + 0.5 − m)/s).
+// The references: Boost's distribution functions.
 INSTANTIATE_TEST_SUITE_P(EveryType, GoodnessOfFit, ::testing::Values(
     FitCase{"Normal", kDistNormal, {100.0, 15.0}, false, [](double x) { return bm::cdf(bm::normal(100.0, 15.0), x); }},
     FitCase{"LogNormal", kDistLognormal, {std::exp(1.0), 0.5}, false, [](double x) { return bm::cdf(bm::lognormal(1.0, 0.5), x); }},
@@ -190,60 +188,112 @@ INSTANTIATE_TEST_SUITE_P(EveryType, GoodnessOfFit, ::testing::Values(
     FitCase{"UserRanges", kDistUserRanges, {0.0, 5.0, 20.0, 5.0, 10.0, 30.0, 0.2, 0.5, 0.3}, false, [](double x) { return PiecewiseCdf({0.0, 5.0, 20.0}, {5.0, 10.0, 30.0}, {0.2, 0.5, 0.3}, x); }},
     FitCase{"Binomial", kDistBinomial, {10.0, 0.3}, true, [](double k) { return bm::cdf(bm::binomial(10.0, 0.3), k); }},
     FitCase{"BinomialOneTrial", kDistBinomial, {1.0, 0.3}, true, [](double k) { return bm::cdf(bm::binomial(1.0, 0.3), k); }},
-    FitCase{"BinomialNormalApprox", kDistBinomial, {200.0, 0.25}, true, [](double k) { return Phi((k + 0.5 - 50.0) / std::sqrt(37.5)); }},
+    FitCase{"BinomialLargeMean", kDistBinomial, {200.0, 0.25}, true, [](double k) { return bm::cdf(bm::binomial(200.0, 0.25), k); }},
     FitCase{"Poisson", kDistPoisson, {3.5}, true, [](double k) { return bm::cdf(bm::poisson(3.5), k); }},
     FitCase{"PoissonSmallMean", kDistPoisson, {0.2}, true, [](double k) { return bm::cdf(bm::poisson(0.2), k); }},
-    FitCase{"PoissonNormalApprox", kDistPoisson, {30.0}, true, [](double k) { return Phi((k + 0.5 - 30.0) / std::sqrt(30.0)); }},
+    FitCase{"PoissonLargeMean", kDistPoisson, {30.0}, true, [](double k) { return bm::cdf(bm::poisson(30.0), k); }},
     FitCase{"NegBinFailures", kDistNegbinomial, {3.0, 0.4, 0.0}, true, [](double k) { return bm::cdf(bm::negative_binomial(3.0, 0.4), k); }},
     FitCase{"NegBinTrials", kDistNegbinomial, {2.5, 0.3, 1.0}, true, [](double k) { return bm::cdf(bm::negative_binomial(2.5, 0.3), k); }, 2.5},
-    // A long tail: much of the mass lies beyond the prepared table of 4096 values.
+    // A long tail: draws beyond the prepared table go to the quantile.
     FitCase{"NegBinLongTail", kDistNegbinomial, {0.02, 0.002, 0.0}, true, [](double k) { return bm::cdf(bm::negative_binomial(0.02, 0.002), k); }},
     FitCase{"Bernoulli", kDistBernoulli, {0.3}, true, [](double k) { return bm::cdf(bm::bernoulli(0.3), k); }},
     FitCase{"EmpiricalBins", kDistEmpirical, {0.0, 10.0, 2.7, 0.0, 0.1, 0.2, 0.4, 0.3}, true, StepCdf({0.1, 0.3, 0.7})}),
     ByName<FitCase>);
 // clang-format on
 
-// The exact discrete inverse.
+// Count inputs are exact at every mean: 10^6 draws per family and mean against Boost's
+// distribution function, in 100 cells of equal expected count placed by its quantiles, and
+// never a value outside the support.
 
-TEST(DiscreteInverse, PoissonAndNegBinAreTheSmallestWholeNumberAboveU) {
-    MCMath_800::MCURandom stream(7u);
-    for (const double lambda : {0.3, 4.0, 17.5}) {
-        for (int i = 0; i < 300; ++i) {
-            const double u = stream.GetRandom();
-            EXPECT_EQ(SECPoissonInverse(lambda, u),
-                      bm::quantile(bm::poisson_distribution<double, RoundUp>(lambda), u))
-                << "lambda " << lambda << " u " << u;
+struct CountCase {
+    DistType fType;
+    double fMean;
+    friend std::ostream& operator<<(std::ostream& os, const CountCase& c) {
+        return os << DistType2String(c.fType) << " mean " << c.fMean;
+    }
+};
+
+class CountDraws : public ::testing::TestWithParam<CountCase> {};
+
+template <class Dist>
+::testing::AssertionResult CountsFollow(const Dist& dist, const std::vector<double>& values,
+                                        double shift) {
+    std::vector<double> ends; // cell c holds k ≤ ends[c] (and > ends[c − 1])
+    for (int c = 1; c < 100; ++c) {
+        const double k = bm::quantile(dist, c / 100.0);
+        if (ends.empty() || k > ends.back()) {
+            ends.push_back(k);
         }
     }
-    for (const auto& [r, p] : {std::pair{3.0, 0.4}, {0.5, 0.05}, {12.0, 0.7}}) {
-        for (int i = 0; i < 300; ++i) {
-            const double u = stream.GetRandom();
-            EXPECT_EQ(SECNegBinInverse(r, p, u),
-                      bm::quantile(bm::negative_binomial_distribution<double, RoundUp>(r, p), u))
-                << "r " << r << " p " << p << " u " << u;
+    std::vector<double> observed(ends.size() + 1, 0.0);
+    for (const double v : values) {
+        const double k = v - shift;
+        if (MCMV::IsMissing(v) || k != std::floor(k) || k < 0.0 || k > bm::support(dist).second) {
+            return ::testing::AssertionFailure() << "value " << v << " outside the support";
         }
+        observed[static_cast<std::size_t>(std::lower_bound(ends.begin(), ends.end(), k) -
+                                          ends.begin())] += 1.0;
     }
-    EXPECT_TRUE(MCMV::IsMissing(SECPoissonInverse(0.0, 0.5)));
-    EXPECT_TRUE(MCMV::IsMissing(SECNegBinInverse(2.0, 0.0, 0.5)));
-    EXPECT_TRUE(MCMV::IsMissing(SECPoissonInverse(2.0, 1.0)));
+    const double n = static_cast<double>(values.size());
+    double chi2 = 0.0;
+    double low = 0.0;
+    for (std::size_t c = 0; c < observed.size(); ++c) {
+        const double high = c < ends.size() ? bm::cdf(dist, ends[c]) : 1.0;
+        const double expected = n * (high - low);
+        chi2 += (observed[c] - expected) * (observed[c] - expected) / expected;
+        low = high;
+    }
+    const double critical =
+        bm::quantile(bm::complement(bm::chi_squared(static_cast<double>(ends.size())), kAlpha));
+    if (chi2 > critical) {
+        return ::testing::AssertionFailure() << "chi-square " << chi2 << " > " << critical;
+    }
+    return ::testing::AssertionSuccess();
 }
 
-TEST(DiscreteInverse, PreparedTableAgreesWithTheSearch) {
-    // The transform looks values up in a prepared table and searches beyond it; both must give
-    // the search's answer for every u, the table's last cell and the long tail included.
-    for (const auto& [type, params] : {std::pair{kDistPoisson, std::vector<double>{6.0}},
-                                       {kDistNegbinomial, std::vector<double>{0.02, 0.002, 0.0}}}) {
-        SECInputGenerator gen;
+TEST_P(CountDraws, FollowTheirDistributionInsideTheSupport) {
+    const auto [type, mean] = GetParam();
+    SECInputGenerator gen;
+    std::vector<double> values;
+    const auto draw = [&](const std::vector<double>& params) {
         ASSERT_TRUE(SECPrepareGenerator(type, params, gen));
-        for (double z = -8.0; z <= 8.0; z += 0.01) {
-            const double u = Phi(z);
-            const double expected = type == kDistPoisson
-                                        ? SECPoissonInverse(params[0], u)
-                                        : SECNegBinInverse(params[0], params[1], u);
-            EXPECT_EQ(SECTransform(gen, z), expected) << "z " << z;
+        MCMath_800::MCURandom stream(977u);
+        MCMath_800::MCRandomValues normal;
+        normal.SetURNGPtr(&stream);
+        ASSERT_TRUE(normal.SetParamNormal());
+        values.resize(1000000);
+        for (double& x : values) {
+            x = SECTransform(gen, normal.GetRandom());
         }
+    };
+    if (type == kDistPoisson) {
+        draw({mean});
+        EXPECT_TRUE(CountsFollow(bm::poisson(mean), values, 0.0));
+    } else if (type == kDistBinomial) {
+        // n·p = mean with p = 0.25, and a Binomial(25, 0.96) near its upper end.
+        const double n = mean == 24.0 ? 25.0 : std::floor(mean / 0.25);
+        const double p = mean == 24.0 ? 0.96 : mean / n;
+        draw({n, p});
+        EXPECT_TRUE(CountsFollow(bm::binomial(n, p), values, 0.0));
+    } else {
+        // Failures before the 3rd success, counted as trials (shifted by 3).
+        const double p = 3.0 / (mean + 3.0);
+        draw({3.0, p, 1.0});
+        EXPECT_TRUE(CountsFollow(bm::negative_binomial(3.0, p), values, 3.0));
     }
 }
+
+INSTANTIATE_TEST_SUITE_P(
+    EveryMean, CountDraws,
+    ::testing::Values(CountCase{kDistPoisson, 0.5}, CountCase{kDistPoisson, 19.9},
+                      CountCase{kDistPoisson, 20.0}, CountCase{kDistPoisson, 33.0},
+                      CountCase{kDistPoisson, 1000.0}, CountCase{kDistPoisson, 1e6},
+                      CountCase{kDistBinomial, 0.5}, CountCase{kDistBinomial, 19.9},
+                      CountCase{kDistBinomial, 20.0}, CountCase{kDistBinomial, 24.0},
+                      CountCase{kDistBinomial, 1000.0}, CountCase{kDistBinomial, 1e6},
+                      CountCase{kDistNegbinomial, 0.5}, CountCase{kDistNegbinomial, 19.9},
+                      CountCase{kDistNegbinomial, 20.0}, CountCase{kDistNegbinomial, 33.0},
+                      CountCase{kDistNegbinomial, 1000.0}, CountCase{kDistNegbinomial, 1e6}));
 
 // Moments, ranges and stored parameters.
 
@@ -276,7 +326,8 @@ const double kNone = MCMV::Missing();
 // Means and standard deviations from Boost's distributions, or by hand where given.
 INSTANTIATE_TEST_SUITE_P(EveryType, Moments, ::testing::Values(
     MomentCase{"Binomial", kDistBinomial, {12.0, 0.25}, 3.0, bm::standard_deviation(bm::binomial(12.0, 0.25)), 0.0, 12.0},
-    MomentCase{"NegBinTrials", kDistNegbinomial, {3.0, 0.4, 1.0}, bm::mean(bm::negative_binomial(3.0, 0.4)), bm::standard_deviation(bm::negative_binomial(3.0, 0.4)), 3.0, kNone},
+    // Trials: the failures' mean plus the r successes.
+    MomentCase{"NegBinTrials", kDistNegbinomial, {3.0, 0.4, 1.0}, 3.0 + bm::mean(bm::negative_binomial(3.0, 0.4)), bm::standard_deviation(bm::negative_binomial(3.0, 0.4)), 3.0, kNone},
     MomentCase{"LogNormal", kDistLognormal, {2.0, 0.5}, bm::mean(bm::lognormal(std::log(2.0), 0.5)), bm::standard_deviation(bm::lognormal(std::log(2.0), 0.5)), 0.0, kNone},
     MomentCase{"Normal", kDistNormal, {100.0, 15.0}, 100.0, 15.0, kNone, kNone},
     MomentCase{"Poisson", kDistPoisson, {4.0}, 4.0, 2.0, 0.0, kNone},
@@ -363,10 +414,22 @@ struct BadValuesCase {
 
 class BadParamValues : public ::testing::TestWithParam<BadValuesCase> {};
 
-TEST_P(BadParamValues, GiveAnUnusableGeneratorThatDrawsMissing) {
+TEST_P(BadParamValues, AreRefusedByTheSimulationAndTheFittingAlike) {
     SECInputGenerator gen;
     EXPECT_FALSE(SECPrepareGenerator(GetParam().fType, GetParam().fParams, gen));
     EXPECT_TRUE(MCMV::IsMissing(SECTransform(gen, 0.3)));
+    EXPECT_TRUE(MCMV::IsMissing(DFCFittedCdf(GetParam().fType, GetParam().fParams)(0.5)));
+}
+
+TEST(DegenerateParams, DrawOneValueButHaveNoDensityToFit) {
+    for (const auto& [type, params] : {std::pair{kDistNormal, std::vector<double>{2.0, 0.0}},
+                                       {kDistLognormal, std::vector<double>{2.0, 0.0}},
+                                       {kDistUniform, std::vector<double>{2.0, 2.0}}}) {
+        SECInputGenerator gen;
+        ASSERT_TRUE(SECPrepareGenerator(type, params, gen));
+        EXPECT_EQ(SECTransform(gen, -1.3), 2.0);
+        EXPECT_TRUE(MCMV::IsMissing(DFCFittedCdf(type, params)(2.5)));
+    }
 }
 
 // clang-format off
