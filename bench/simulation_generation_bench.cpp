@@ -10,6 +10,7 @@
 //                                factory (wall clock)
 //   BM_CorrelationModel/n        the NORTA model of the 15 pairs on n threads (wall clock)
 //   BM_Transform/<type>          one transform z → value of a single input
+//   BM_PrepareCount/<type>       preparing the exact inverse of a count input
 #include "simulation_common/spcsettings.h"
 #include "simulation_evaluation/secgeneration.h"
 #include "simulation_evaluation/secsettings.h"
@@ -128,8 +129,31 @@ BENCHMARK_CAPTURE(BM_Transform, Triangular, kDistTriangular, {1.0, 10.0, 4.0});
 BENCHMARK_CAPTURE(BM_Transform, Uniform, kDistUniform, {0.0, 1.0});
 BENCHMARK_CAPTURE(BM_Transform, Gamma, kDistGamma, {2.0, 0.5});
 BENCHMARK_CAPTURE(BM_Transform, Beta, kDistBeta, {2.0, 5.0});
-BENCHMARK_CAPTURE(BM_Transform, Poisson, kDistPoisson, {4.0});
-BENCHMARK_CAPTURE(BM_Transform, NegBin, kDistNegbinomial, {3.0, 0.4, 0.0});
+// Count inputs, inverted exactly at every mean: Poisson(m), NegBin(3, 3/(m + 3)) and
+// Binomial(4m, 0.25) (Binomial(2, 0.25) for m = 0.5) at means 0.5, 33, 1000 and 10^6.
+BENCHMARK_CAPTURE(BM_Transform, Poisson_0_5, kDistPoisson, {0.5});
+BENCHMARK_CAPTURE(BM_Transform, Poisson_33, kDistPoisson, {33.0});
+BENCHMARK_CAPTURE(BM_Transform, Poisson_1000, kDistPoisson, {1000.0});
+BENCHMARK_CAPTURE(BM_Transform, Poisson_1e6, kDistPoisson, {1e6});
+BENCHMARK_CAPTURE(BM_Transform, NegBin_0_5, kDistNegbinomial, {3.0, 3.0 / 3.5, 0.0});
+BENCHMARK_CAPTURE(BM_Transform, NegBin_33, kDistNegbinomial, {3.0, 3.0 / 36.0, 0.0});
+BENCHMARK_CAPTURE(BM_Transform, NegBin_1000, kDistNegbinomial, {3.0, 3.0 / 1003.0, 0.0});
+BENCHMARK_CAPTURE(BM_Transform, NegBin_1e6, kDistNegbinomial, {3.0, 3.0 / 1000003.0, 0.0});
+BENCHMARK_CAPTURE(BM_Transform, Binomial_0_5, kDistBinomial, {2.0, 0.25});
+BENCHMARK_CAPTURE(BM_Transform, Binomial_33, kDistBinomial, {132.0, 0.25});
+BENCHMARK_CAPTURE(BM_Transform, Binomial_1000, kDistBinomial, {4000.0, 0.25});
+BENCHMARK_CAPTURE(BM_Transform, Binomial_1e6, kDistBinomial, {4e6, 0.25});
+
+//! Preparing one count input: its table of F over the central 1 − 2·10^−12 of the mass.
+void BM_PrepareCount(benchmark::State& state, DistType type, std::vector<double> params) {
+    for (auto _ : state) {
+        SECInputGenerator gen;
+        benchmark::DoNotOptimize(SECPrepareGenerator(type, params, gen));
+    }
+}
+BENCHMARK_CAPTURE(BM_PrepareCount, Poisson_1e6, kDistPoisson, {1e6})->Unit(benchmark::kMillisecond);
+BENCHMARK_CAPTURE(BM_PrepareCount, NegBin_1e6, kDistNegbinomial, {3.0, 3.0 / 1000003.0, 0.0})
+    ->Unit(benchmark::kMillisecond);
 
 } // namespace
 

@@ -34,6 +34,10 @@ constexpr double kRange = 37.0;
 //! Longest Gauss–Legendre piece: at k = 512 the Hermite functions oscillate with a wavelength
 //! of about 0.2, which 20 nodes on 0.5 integrate to ~1e-13.
 constexpr double kPiece = 0.5;
+//! Range on a side where the transform is bounded (a finite end of the natural range): beyond
+//! it the values lie between T(±10) and that end and carry Φ̄(10) ≈ 7.6e-24 of the mass, while
+//! the exact quantiles of the far tails (Gamma, Beta) cost microseconds each.
+constexpr double kBoundedRange = 10.0;
 //! Range of the inner standard normal W of the direct integral (φ(12) ≈ 5e-32).
 constexpr double kInnerRange = 12.0;
 //! Beyond 9 standard deviations Φ̄ is 0 or 1 to 1e-19.
@@ -103,18 +107,29 @@ template <class F> void ForEachNode(std::vector<double>& points, F&& f) {
     }
 }
 
-//! The points [−range, range] in steps of kPiece plus the finite `breaks` inside.
-std::vector<double> Mesh(double range, const std::vector<double>& breaks) {
+//! The points [−below, above] in steps of kPiece plus the finite `breaks` inside.
+std::vector<double> Mesh(double below, double above, const std::vector<double>& breaks) {
     std::vector<double> points;
-    for (double z = -range; z <= range; z += kPiece) {
+    for (double z = -below; z <= above; z += kPiece) {
         points.push_back(z);
     }
     for (const double b : breaks) {
-        if (std::fabs(b) < range) {
+        if (b > -below && b < above) {
             points.push_back(b);
         }
     }
     return points;
+}
+
+std::vector<double> Mesh(double range, const std::vector<double>& breaks) {
+    return Mesh(range, range, breaks);
+}
+
+//! The mesh of a continuous transform: kRange on an unbounded side, kBoundedRange on a
+//! bounded one.
+std::vector<double> TransformMesh(const SECInputGenerator& gen, const std::vector<double>& breaks) {
+    return Mesh(MCMV::IsMissing(gen.fLower) ? kRange : kBoundedRange,
+                MCMV::IsMissing(gen.fUpper) ? kRange : kBoundedRange, breaks);
 }
 
 //! The z where a continuous transform has a kink or a jump: the Triangular's mode and the cell
@@ -240,7 +255,7 @@ bool PrepareDiscrete(const std::vector<double>& cdf, SECNortaMargin& m) {
 
 bool PrepareContinuous(const SECInputGenerator& gen, SECNortaMargin& m) {
     m.fvBreaks = ContinuousBreaks(gen);
-    std::vector<double> points = Mesh(kRange, m.fvBreaks);
+    std::vector<double> points = TransformMesh(gen, m.fvBreaks);
     std::vector<double> nodes;
     std::vector<double> weights;
     std::vector<double> values;
@@ -326,9 +341,9 @@ double PairedSteps(const SECNortaMargin& a, const SECNortaMargin& b, double r) {
     for (const double cut : b.fvCuts) {
         points.push_back(r * cut);
     }
-    points.erase(std::remove_if(points.begin(), points.end(),
-                                [](double p) { return !std::isfinite(p); }),
-                 points.end());
+    points.erase(
+        std::remove_if(points.begin(), points.end(), [](double p) { return !std::isfinite(p); }),
+        points.end());
     std::sort(points.begin(), points.end());
     points.erase(std::unique(points.begin(), points.end()), points.end());
     double sum = 0.0;
@@ -354,7 +369,9 @@ double DirectCorrelation(const SECNortaMargin& a, const SECNortaMargin& b, doubl
     const SECNortaMargin& outer = swap ? b : a;
     const SECNortaMargin& inner = swap ? a : b;
     const double s = std::sqrt(std::max(0.0, 1.0 - r * r));
-    std::vector<double> points = Mesh(kRange, outer.fvBreaks);
+    std::vector<double> points = outer.fbDiscrete || outer.fpGenerator == nullptr
+                                     ? Mesh(kRange, outer.fvBreaks)
+                                     : TransformMesh(*outer.fpGenerator, outer.fvBreaks);
     if (r != 0.0) {
         const double width = s / std::fabs(r);
         for (const double beta : inner.fvBreaks) {
@@ -372,8 +389,8 @@ double DirectCorrelation(const SECNortaMargin& a, const SECNortaMargin& b, doubl
     double sum = 0.0;
     ForEachNode(points, [&](double x, double w) {
         if (std::fabs(x) <= kRange) {
-            sum += w * Pdf(x) * (MarginTransform(outer, x) - outer.fMean) *
-                   InnerMean(inner, r * x, s);
+            sum +=
+                w * Pdf(x) * (MarginTransform(outer, x) - outer.fMean) * InnerMean(inner, r * x, s);
         }
     });
     return sum / (a.fStdDev * b.fStdDev);
@@ -395,7 +412,8 @@ struct PairSeries {
         }
         const double bound = std::sqrt(a.fvTails[k] * b.fvTails[k]) * scale;
         if (bound > SECNortaConst::kSeriesError) {
-            fRadius = std::pow(SECNortaConst::kSeriesError / bound, 1.0 / static_cast<double>(k + 1));
+            fRadius =
+                std::pow(SECNortaConst::kSeriesError / bound, 1.0 / static_cast<double>(k + 1));
         }
     }
     double operator()(double r) const {
@@ -429,8 +447,8 @@ bool SECPrepareNortaMargin(const SECInputGenerator& gen, SECNortaMargin& margin)
     margin.fbNormal = gen.fDistType == MCSPConst::kDistNormal;
     std::vector<double> cdf;
     margin.fbDiscrete = SECDiscreteSupport(gen, SECNortaConst::kMaxSupport, margin.fvValues, cdf);
-    const bool ok = margin.fbDiscrete ? PrepareDiscrete(cdf, margin)
-                                      : PrepareContinuous(gen, margin);
+    const bool ok =
+        margin.fbDiscrete ? PrepareDiscrete(cdf, margin) : PrepareContinuous(gen, margin);
     if (!ok) {
         margin.fvCoefs.clear();
         return false;
@@ -482,8 +500,8 @@ SECNortaSearchResult SECNortaSearch(double rho, const std::function<double(doubl
         std::uintmax_t iterations = 200;
         const auto [lo, hi] = boost::math::tools::toms748_solve(
             [&](double r) { return evaluate(r) - rho; }, -1.0, 1.0, result.fGLow - rho,
-            result.fGHigh - rho, [](double a, double b) { return std::fabs(b - a) <= kRootBracket; },
-            iterations);
+            result.fGHigh - rho,
+            [](double a, double b) { return std::fabs(b - a) <= kRootBracket; }, iterations);
         result.fNormalCorr = 0.5 * (lo + hi);
     } catch (const SearchStopped&) {
         result.fNormalCorr = MCMV::Missing();
