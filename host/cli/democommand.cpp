@@ -1,5 +1,6 @@
 #include "cli/democommand.h"
 
+#include "cli/commandline.h"
 #include "cli/fitcommand.h"
 #include "cli/simulatecommand.h"
 #include "common/hosterror.h"
@@ -84,10 +85,10 @@ CLI::App* AddDemoCommand(CLI::App& app, DemoOptions& options) {
                      "The examples folder (default: " + std::string(MCSIM_DEFAULT_EXAMPLES_DIR) +
                          ")");
     demo->add_option("--cases", options.fCases, "Cases to simulate")
-        ->check(CLI::Range(1, 10000000))
+        ->transform(WholeNumber(1, 10000000))
         ->capture_default_str();
     demo->add_option("--threads", options.fThreads, "Worker threads (0: one per processor)")
-        ->check(CLI::Range(0, 1024))
+        ->transform(WholeNumber(0, 1024))
         ->capture_default_str();
     return demo;
 }

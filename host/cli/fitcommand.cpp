@@ -1,5 +1,6 @@
 #include "cli/fitcommand.h"
 
+#include "cli/commandline.h"
 #include "cli/interrupt.h"
 #include "cli/progress.h"
 #include "cli/statustext.h"
@@ -17,9 +18,11 @@
 
 #include <algorithm>
 #include <cmath>
+#include <cstdio>
 #include <filesystem>
 #include <iomanip>
 #include <map>
+#include <memory>
 #include <set>
 #include <sstream>
 #include <thread>
@@ -61,17 +64,17 @@ std::map<std::string, MeasureLevel> CollectLevels(const FitOptions& options) {
         const std::size_t eq = entry.rfind('=');
         MeasureLevel level = kLevelUnknown;
         if (eq == std::string::npos || eq == 0 || !ParseMeasureLevel(entry.substr(eq + 1), level)) {
-            throw HostError("--level " + entry +
-                            ": expected NAME=LEVEL with LEVEL continuous, ordinal or "
-                            "categorical");
+            throw UsageError("--level " + entry +
+                             ": expected NAME=LEVEL with LEVEL continuous, ordinal or "
+                             "categorical");
         }
         levels[entry.substr(0, eq)] = level;
     }
     for (const std::string& name : options.fvFactors) {
         const auto it = levels.find(name);
         if (it != levels.end() && it->second != kLevelCategorical) {
-            throw HostError("field '" + name + "' is a factor (--factors) and " +
-                            MeasureLevelName(it->second) + " (--level) at once");
+            throw UsageError("field '" + name + "' is a factor (--factors) and " +
+                             MeasureLevelName(it->second) + " (--level) at once");
         }
         levels[name] = kLevelCategorical;
     }
@@ -83,9 +86,53 @@ char ParseDelimiter(const std::string& text) {
         return '\t';
     }
     if (text.size() != 1 || text[0] == '"' || text[0] == '\n' || text[0] == '\r') {
-        throw HostError("--delimiter " + text + ": expected one character (or 'tab')");
+        throw UsageError("--delimiter " + text + ": expected one character (or 'tab')");
     }
     return text[0];
+}
+
+//! The file's separator and how it was chosen, with what the start of the file suggests.
+struct CsvLayout {
+    char fDelimiter = ',';  //!< the separator used
+    bool fbGuessed = false; //!< found in the first rows, not given
+    SeparatorGuess fGuess;  //!< what the first rows say, read with fDelimiter
+};
+
+//! --delimiter, or the separator found in the first rows of the file.
+CsvLayout ChooseSeparator(const FitOptions& options) {
+    CsvLayout layout;
+    layout.fbGuessed = options.fDelimiter.empty();
+    std::string candidates;
+    if (layout.fbGuessed) {
+        for (char c : kSeparatorCandidates) {
+            // A decimal comma cannot also separate the fields.
+            if (!(options.fbDecimalComma && c == ',')) {
+                candidates += c;
+            }
+        }
+    } else {
+        candidates = std::string(1, ParseDelimiter(options.fDelimiter));
+    }
+    if (options.fbDecimalComma && candidates == ",") {
+        throw UsageError("--decimal-comma: the comma cannot be the decimal mark and the "
+                         "separator at once; give the file's separator with --delimiter");
+    }
+    layout.fGuess = GuessSeparator(ReadSeparatorSample(options.fDataPath), candidates);
+    layout.fDelimiter = layout.fGuess.fDelimiter;
+    return layout;
+}
+
+//! What to tell the user when the header reads as one field holding another separator; ""
+//! when it does not.
+std::string SeparatorAdvice(const CsvLayout& layout) {
+    const char other = layout.fGuess.fInOneFieldHeader;
+    if (other == 0) {
+        return std::string();
+    }
+    return "the header reads as one field holding " + SeparatorName(other) +
+           ": if that separates the fields, give --delimiter " +
+           (other == '\t' ? std::string("tab") : "'" + std::string(1, other) + "'") +
+           (other != ',' ? " (and --decimal-comma for numbers written 3,14)" : "");
 }
 
 void AppendUnique(std::vector<std::string>& list, const std::string& name) {
@@ -412,7 +459,7 @@ std::vector<FixedValue> ParseFixed(const std::vector<std::string>& entries) {
         double value = 0.0;
         if (eq == std::string::npos || eq == 0 ||
             !MCCommon_800::ParseDouble(entry.substr(eq + 1), value) || !std::isfinite(value)) {
-            throw HostError("--fixed " + entry + ": expected NAME=NUMBER");
+            throw UsageError("--fixed " + entry + ": expected NAME=NUMBER");
         }
         fixed.push_back(FixedValue{entry.substr(0, eq), value});
     }
@@ -525,6 +572,105 @@ FormulaModel LoadModelFor(const FitOptions& options, const std::vector<std::stri
     return model;
 }
 
+//! Problems with the options that need no file, and output files that would replace an input
+//! or each other or cannot be written: all before any work.
+void CheckFitOptions(const FitOptions& options) {
+    if (options.fPlanPath.empty() &&
+        (!options.fModelPath.empty() || !options.fvTargets.empty() || !options.fvFixed.empty())) {
+        throw UsageError("--model, --targets and --fixed describe the plan: add -o PLAN.xml");
+    }
+    if (options.fModelPath.empty() && !options.fvTargets.empty()) {
+        throw UsageError("--targets needs --model");
+    }
+    static_cast<void>(CollectLevels(options));
+    static_cast<void>(ParseFixed(options.fvFixed));
+    CheckOutputFiles({{"data file", options.fDataPath}, {"model file", options.fModelPath}},
+                     {{"-o", options.fPlanPath}, {"--fit-stats", options.fFitStatsPath}});
+}
+
+//! Builds the data dictionary; a failure, or a header of one field, that looks like the wrong
+//! separator gets the advice to name the right one.
+DataDictionary ReadDictionary(const FitOptions& options, const CsvLayout& layout,
+                              const DataOptions& dataOptions, const DataProgress& progress,
+                              std::ostream& err) {
+    const std::string advice = SeparatorAdvice(layout);
+    try {
+        DataDictionary dict = DataDictionary::Build(options.fDataPath, dataOptions, progress);
+        if (!advice.empty() && dict.GetNColumns() == 1) {
+            err << "mcsim: note: " << LocatedMessage(options.fDataPath, 0, advice) << "\n";
+        }
+        if (!options.fbDecimalComma && !layout.fGuess.fDecimalCommaCell.empty()) {
+            err << "mcsim: note: "
+                << LocatedMessage(options.fDataPath, 0,
+                                  "cells such as '" + layout.fGuess.fDecimalCommaCell +
+                                      "' are read as text; give --decimal-comma if the comma "
+                                      "is the decimal mark")
+                << "\n";
+        }
+        return dict;
+    } catch (const HostError& e) {
+        if (advice.empty()) {
+            throw;
+        }
+        throw HostError(std::string(e.what()) + "; " + advice);
+    }
+}
+
+//! Writes the plan and the statistics document, both or neither. False, with nothing written,
+//! when an interrupt came before the files were put in place.
+bool WriteOutputs(const FitOptions& options, const DataDictionary& dict,
+                  const std::vector<std::string>& fields, const DFCOutputStats& results,
+                  const FormulaModel* model, InterruptWatcher& interrupt, std::ostream& out,
+                  std::ostream& err) {
+    MCMCSP_800::MCPlanXMLHandler handler;
+    std::string planXml;
+    if (!options.fPlanPath.empty()) {
+        const SPCSettings plan = BuildPlan(options, dict, fields, results, model, err);
+        if (!handler.WritePlanFile(planXml, &plan)) {
+            throw HostError(
+                LocatedMessage(options.fPlanPath, 0, "the plan could not be turned into XML"));
+        }
+    }
+    std::string statsXml;
+    if (!options.fFitStatsPath.empty() && !handler.WriteFittingOutStats(statsXml, &results)) {
+        throw HostError(LocatedMessage(options.fFitStatsPath, 0,
+                                       "the fitting statistics could not be turned into XML"));
+    }
+    std::vector<std::unique_ptr<AtomicFileWriter>> writers;
+    for (const auto& [path, xml] :
+         {std::pair{&options.fPlanPath, &planXml}, std::pair{&options.fFitStatsPath, &statsXml}}) {
+        if (path->empty()) {
+            continue;
+        }
+        writers.push_back(std::make_unique<AtomicFileWriter>(*path));
+        if (!writers.back()->IsOpen()) {
+            throw HostError(writers.back()->GetError());
+        }
+        writers.back()->GetStream() << *xml;
+    }
+    OutputCommitScope commits;
+    if (interrupt.IsCancelled()) {
+        return false;
+    }
+    interrupt.Finish();
+    for (std::size_t i = 0; i < writers.size(); ++i) {
+        if (!writers[i]->Commit()) {
+            // The files go in together or not at all.
+            for (std::size_t k = 0; k < i; ++k) {
+                std::remove(writers[k]->GetPath().c_str());
+            }
+            throw HostError(writers[i]->GetError());
+        }
+    }
+    if (!options.fPlanPath.empty()) {
+        out << "\nplan written to " << options.fPlanPath << "\n";
+    }
+    if (!options.fFitStatsPath.empty()) {
+        out << "fitting statistics written to " << options.fFitStatsPath << "\n";
+    }
+    return true;
+}
+
 } // namespace
 
 CLI::App* AddFitCommand(CLI::App& app, FitOptions& options) {
@@ -555,26 +701,28 @@ CLI::App* AddFitCommand(CLI::App& app, FitOptions& options) {
     fit->add_flag("--crosstabs", options.fbCrosstabs,
                   "Fit the joint contingency table of the categorical fields");
     fit->add_option("--cases", options.fCases, "Use only the first N rows (0: all)")
-        ->check(CLI::NonNegativeNumber)
+        ->transform(WholeNumber(0, 2147483647))
         ->capture_default_str();
     fit->add_option("--bins", options.fBins, "Histogram bins of continuous fields")
-        ->check(CLI::Range(2, 100000))
+        ->transform(WholeNumber(2, 100000))
         ->capture_default_str();
     fit->add_option("--threads", options.fThreads, "Worker threads (0: one per processor)")
-        ->check(CLI::Range(0, 1024))
+        ->transform(WholeNumber(0, 1024))
         ->capture_default_str();
     fit->add_option("--delimiter", options.fDelimiter,
-                    "Field separator of the file ('tab' for "
-                    "a tab)")
-        ->capture_default_str();
+                    "Field separator of the file ('tab' for a tab; default: the one of comma, "
+                    "semicolon, tab and pipe that splits the header and first rows evenly)");
+    fit->add_flag("--decimal-comma", options.fbDecimalComma,
+                  "Numbers are written with a decimal comma (3,14); the separator is then not "
+                  "a comma");
     fit->add_option("--max-ordinal-values", options.fMaxOrdinalValues,
                     "Whole-number fields with at most this many distinct values are ordinal")
-        ->check(CLI::Range(1, 1000))
+        ->transform(WholeNumber(1, 1000))
         ->capture_default_str();
     fit->add_option("--cache-mb", options.fCacheMegabytes,
                     "Megabytes for keeping the data in memory after its first reading (0: read "
                     "the file again for every data pass)")
-        ->check(CLI::Range(std::uint64_t{0}, std::uint64_t{1} << 30))
+        ->transform(WholeNumber(0, std::int64_t{1} << 30))
         ->capture_default_str();
     fit->add_option("-o,--output", options.fPlanPath,
                     "Write the simulation plan to this file (XML)");
@@ -598,8 +746,11 @@ int RunFit(const FitOptions& options, std::ostream& out, std::ostream& err) {
     InterruptWatcher interrupt;
     ProgressBar progress(options.fbProgress);
     try {
+        CheckFitOptions(options);
+        const CsvLayout layout = ChooseSeparator(options);
         DataOptions dataOptions;
-        dataOptions.fDelimiter = ParseDelimiter(options.fDelimiter);
+        dataOptions.fDelimiter = layout.fDelimiter;
+        dataOptions.fbDecimalComma = options.fbDecimalComma;
         dataOptions.fLevels = CollectLevels(options);
         dataOptions.fMaxOrdinalValues = options.fMaxOrdinalValues;
         dataOptions.fMaxCacheBytes = options.fCacheMegabytes << 20;
@@ -613,13 +764,15 @@ int RunFit(const FitOptions& options, std::ostream& out, std::ostream& err) {
             }
         }
         const std::string& path = options.fDataPath;
-        const DataDictionary dict =
-            DataDictionary::Build(path, dataOptions, [&](std::uint64_t done, std::uint64_t total) {
+        const DataDictionary dict = ReadDictionary(
+            options, layout, dataOptions,
+            [&](std::uint64_t done, std::uint64_t total) {
                 if (interrupt.IsCancelled()) {
                     throw ReadCancelled();
                 }
                 progress.Show("reading " + path, done, total);
-            });
+            },
+            err);
         progress.Clear();
         if (!options.fWeight.empty() && dict.FindField(options.fWeight) < 0) {
             throw HostError(
@@ -631,13 +784,6 @@ int RunFit(const FitOptions& options, std::ostream& out, std::ostream& err) {
         const std::vector<std::string> fields = FieldsToFit(options, dict);
         if (fields.empty()) {
             throw HostError(LocatedMessage(path, 0, "there is no field to fit"));
-        }
-        if (options.fPlanPath.empty() && (!options.fModelPath.empty() ||
-                                          !options.fvTargets.empty() || !options.fvFixed.empty())) {
-            throw HostError("--model, --targets and --fixed describe the plan: add -o PLAN.xml");
-        }
-        if (options.fModelPath.empty() && !options.fvTargets.empty()) {
-            throw HostError("--targets needs --model");
         }
         // The model is read before the fitting, so a bad model costs no data passes.
         std::unique_ptr<FormulaModel> model;
@@ -671,7 +817,7 @@ int RunFit(const FitOptions& options, std::ostream& out, std::ostream& err) {
         if (status.GetErrorCode() == MCCommon_800::kCancelledCode || interrupt.IsCancelled()) {
             err << "mcsim: fit cancelled during data pass " << records.GetPassCount() << " after "
                 << records.GetRecordsRead() << " rows; nothing was fitted or written\n";
-            return 130;
+            return ExitStatus::kInterrupted;
         }
         // Listwise deletion can leave nothing; say so rather than pass on the step's code.
         if (algorithm.GetNRecords() > 0 && algorithm.GetNValidRecords() == 0) {
@@ -695,8 +841,13 @@ int RunFit(const FitOptions& options, std::ostream& out, std::ostream& err) {
             return 1;
         }
         out << "fitted " << fields.size() << (fields.size() == 1 ? " field" : " fields") << " of "
-            << path << ": " << algorithm.GetNRecords() << " rows read, "
-            << algorithm.GetNValidRecords() << " used";
+            << path;
+        if (layout.fbGuessed && layout.fDelimiter != ',') {
+            out << " (separator " << SeparatorName(layout.fDelimiter)
+                << ", found in its first rows)";
+        }
+        out << ": " << algorithm.GetNRecords() << " rows read, " << algorithm.GetNValidRecords()
+            << " used";
         if (algorithm.GetNInvalidRecords() > 0) {
             out << ", " << algorithm.GetNInvalidRecords()
                 << " left out (a missing value in a fitted field"
@@ -721,38 +872,17 @@ int RunFit(const FitOptions& options, std::ostream& out, std::ostream& err) {
         PrintCrosstabs(out, *results);
         PrintWarnings(out, algorithm.GetWarnings());
 
-        MCMCSP_800::MCPlanXMLHandler handler;
-        std::string error;
-        if (!options.fPlanPath.empty()) {
-            const SPCSettings plan = BuildPlan(options, dict, fields, *results, model.get(), err);
-            std::string xml;
-            if (!handler.WritePlanFile(xml, &plan)) {
-                throw HostError(
-                    LocatedMessage(options.fPlanPath, 0, "the plan could not be turned into XML"));
-            }
-            if (!WriteFileAtomically(options.fPlanPath, xml, error)) {
-                throw HostError(error);
-            }
-            out << "\nplan written to " << options.fPlanPath << "\n";
+        if (!WriteOutputs(options, dict, fields, *results, model.get(), interrupt, out, err)) {
+            err << "mcsim: interrupted after the fitting; the results are printed above, but "
+                   "no file was written\n";
+            return ExitStatus::kInterrupted;
         }
-        if (!options.fFitStatsPath.empty()) {
-            std::string xml;
-            if (!handler.WriteFittingOutStats(xml, results)) {
-                throw HostError(LocatedMessage(options.fFitStatsPath, 0,
-                                               "the fitting statistics could not be turned "
-                                               "into XML"));
-            }
-            if (!WriteFileAtomically(options.fFitStatsPath, xml, error)) {
-                throw HostError(error);
-            }
-            out << "fitting statistics written to " << options.fFitStatsPath << "\n";
-        }
-        return 0;
+        return ExitStatus::kDone;
     } catch (const ReadCancelled&) {
         progress.Clear();
         err << "mcsim: cancelled while reading " << options.fDataPath
             << "; nothing was fitted or written\n";
-        return 130;
+        return ExitStatus::kInterrupted;
     } catch (...) {
         return ReportCommandFailure(progress, err);
     }

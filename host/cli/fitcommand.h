@@ -28,7 +28,8 @@ struct FitOptions {
     int fCases = 0;                     //!< rows to use, 0 all
     int fBins = 100;                    //!< histogram bins
     int fThreads = 0;                   //!< worker threads, 0 one per processor
-    std::string fDelimiter = ",";       //!< field separator ("tab" for a tab)
+    std::string fDelimiter;             //!< field separator ("tab" for a tab), "" to find it
+    bool fbDecimalComma = false;        //!< numbers are written with a decimal comma
     int fMaxOrdinalValues = 20;         //!< ordinal inference threshold
     //! Megabytes of the data kept in memory after the first reading for the fitting's passes
     //! (0: the file is read again for every pass).
@@ -44,8 +45,9 @@ struct FitOptions {
 //! Adds the `fit` subcommand to `app`, storing into `options`; returns it.
 CLI::App* AddFitCommand(CLI::App& app, FitOptions& options);
 
-//! Runs the fit. Results go to `out`, messages to `err`. Returns the exit status: 0 done,
-//! 1 failed (the message names the file, line or field), 130 cancelled.
+//! Runs the fit. Results go to `out`, messages to `err`. Returns the exit status
+//! (cli/commandline.h): 0 done, 1 failed (the message names the file, line or field), 2 a
+//! usage error found before any work, 130 cancelled.
 int RunFit(const FitOptions& options, std::ostream& out, std::ostream& err);
 
 } // namespace MCHost

@@ -1,8 +1,10 @@
 #include "cli/interrupt.h"
 
+#include "cli/commandline.h"
+#include "common/atomicfile.h"
+
 #include <cerrno>
 #include <csignal>
-#include <cstdlib>
 #include <ctime>
 
 #include <pthread.h>
@@ -25,6 +27,8 @@ sigset_t InterruptSet() {
     sigset_t set;
     sigemptyset(&set);
     sigaddset(&set, SIGINT);
+    sigaddset(&set, SIGTERM);
+    sigaddset(&set, SIGHUP);
     return set;
 }
 
@@ -62,12 +66,32 @@ void InterruptWatcher::Watch() {
     const sigset_t set = InterruptSet();
     const timespec wait{0, 100 * 1000 * 1000};
     while (!fbStop.load()) {
-        if (::sigtimedwait(&set, nullptr, &wait) != SIGINT || fbStop.load()) {
+        const int caught = ::sigtimedwait(&set, nullptr, &wait);
+        if (caught <= 0 || fbStop.load()) {
             continue;
         }
-        if (fbInterrupted.exchange(true)) {
-            Say("\nmcsim: interrupted again, stopping now\n");
-            std::_Exit(130);
+        if (caught == SIGTERM) {
+            RemoveUncommittedFilesAndExit(ExitStatus::kTerminated,
+                                          "\nmcsim: terminated (SIGTERM); no unfinished output "
+                                          "file is left\n");
+        }
+        if (caught == SIGHUP) {
+            RemoveUncommittedFilesAndExit(ExitStatus::kHangup,
+                                          "\nmcsim: hangup (SIGHUP); no unfinished output file "
+                                          "is left\n");
+        }
+        if (fbInterrupted.load()) {
+            RemoveUncommittedFilesAndExit(ExitStatus::kInterrupted,
+                                          "\nmcsim: interrupted again, stopping now\n");
+        }
+        {
+            // An interrupt during the last outputs' renames waits for them; after them the
+            // work is done and there is nothing to stop.
+            OutputCommitScope commits;
+            if (fbFinished.load()) {
+                continue;
+            }
+            fbInterrupted.store(true);
         }
         Say("\nmcsim: interrupted, stopping (press Ctrl-C again to quit at once)\n");
         std::lock_guard<std::mutex> guard(fMutex);

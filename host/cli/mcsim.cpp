@@ -4,7 +4,9 @@
 //   mcsim simulate PLAN.xml [options]  simulate a plan with its model
 //   mcsim demo [options]               the bundled example end to end
 //
-// Every subcommand answers --help.
+// Every subcommand answers --help. The exit status is 0, 1, 2, or 128 + the signal that ended
+// the run (cli/commandline.h).
+#include "cli/commandline.h"
 #include "cli/democommand.h"
 #include "cli/fitcommand.h"
 #include "cli/simulatecommand.h"
@@ -25,11 +27,13 @@ int main(int argc, char** argv) {
     CLI::App* simulate = MCHost::AddSimulateCommand(app, simulateOptions);
     MCHost::DemoOptions demoOptions;
     CLI::App* demo = MCHost::AddDemoCommand(app, demoOptions);
+    for (CLI::App* command : {&app, fit, simulate, demo}) {
+        command->footer(MCHost::kExitStatusHelp);
+    }
 
-    try {
-        app.parse(argc, argv);
-    } catch (const CLI::ParseError& e) {
-        return app.exit(e);
+    const int parsed = MCHost::ParseCommandLine(app, argc, argv, std::cout, std::cerr);
+    if (parsed >= 0) {
+        return parsed;
     }
     if (fit->parsed()) {
         return MCHost::RunFit(fitOptions, std::cout, std::cerr);
@@ -40,5 +44,5 @@ int main(int argc, char** argv) {
     if (demo->parsed()) {
         return MCHost::RunDemo(demoOptions, std::cout, std::cerr);
     }
-    return 1;
+    return MCHost::ExitStatus::kUsage;
 }

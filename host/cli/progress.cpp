@@ -1,5 +1,8 @@
 #include "cli/progress.h"
 
+#include "cli/commandline.h"
+#include "common/hosterror.h"
+
 #include <algorithm>
 #include <cstdio>
 #include <exception>
@@ -56,6 +59,9 @@ int ReportCommandFailure(ProgressBar& progress, std::ostream& err) {
     progress.Clear();
     try {
         throw;
+    } catch (const UsageError& e) {
+        err << "mcsim: " << e.what() << "\n";
+        return ExitStatus::kUsage;
     } catch (const std::bad_alloc&) {
         err << "mcsim: out of memory\n";
     } catch (const std::exception& e) {
@@ -63,7 +69,7 @@ int ReportCommandFailure(ProgressBar& progress, std::ostream& err) {
     } catch (...) {
         err << "mcsim: an unexpected failure\n";
     }
-    return 1;
+    return ExitStatus::kFailed;
 }
 
 } // namespace MCHost

@@ -33,7 +33,7 @@ private:
 
 //! For a command's `catch (...)`: clears `progress` and prints the exception being handled as
 //! one "mcsim: ..." line on `err` ("out of memory" for std::bad_alloc, the message of any
-//! other std::exception). Returns the command's exit status, 1.
+//! other std::exception). Returns the command's exit status: 2 for a UsageError, else 1.
 int ReportCommandFailure(ProgressBar& progress, std::ostream& err);
 
 } // namespace MCHost

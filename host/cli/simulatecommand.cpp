@@ -1,5 +1,6 @@
 #include "cli/simulatecommand.h"
 
+#include "cli/commandline.h"
 #include "cli/interrupt.h"
 #include "cli/progress.h"
 #include "cli/report.h"
@@ -240,20 +241,6 @@ private:
     InterruptWatcher& fWatcher; //!< the command's interrupt watcher
 };
 
-//! Fails early, before the run, when `path` cannot be created.
-void CheckWritable(const std::string& path, const char* option) {
-    AtomicFileWriter probe(path);
-    if (!probe.IsOpen()) {
-        throw HostError(std::string(option) + ": " + probe.GetError());
-    }
-    probe.Abort();
-}
-
-bool SameFile(const std::string& a, const std::string& b) {
-    std::error_code ec;
-    return fs::weakly_canonical(a, ec) == fs::weakly_canonical(b, ec);
-}
-
 //! The case file's input columns: the simulated inputs in plan order, categorical ones with
 //! their categories as labels.
 std::vector<SinkColumn> InputColumns(const PlanDictionary& dict) {
@@ -297,23 +284,18 @@ void FillSettings(const SimulateOptions& options, MCThread_800::IMCThreadFactory
     settings.SetTornadoVariance(options.fbVariance);
 }
 
-//! Problems with the options that CLI11's checks do not see.
-void CheckOptions(const SimulateOptions& options) {
+//! Problems with the options that CLI11's checks do not see, and output files that would
+//! replace an input or each other (`modelPath`: the model file, "" while it is not known).
+void CheckOptions(const SimulateOptions& options, const std::string& modelPath) {
     for (double p : options.fvPercentiles) {
         if (!(p > 0.0 && p < 100.0)) {
-            throw HostError("--percentiles: " + MCCommon_800::FormatDefault(p) +
-                            " is not between 0 and 100");
+            throw UsageError("--percentiles " + MCCommon_800::FormatDefault(p) +
+                             ": a percentile lies strictly between 0 and 100 (such as 2.5 "
+                             "or 97.5)");
         }
     }
-    if (!options.fCasesOut.empty() && !options.fJsonPath.empty() &&
-        SameFile(options.fCasesOut, options.fJsonPath)) {
-        throw HostError("--cases-out and --json name the same file");
-    }
-    for (const std::string* path : {&options.fCasesOut, &options.fJsonPath}) {
-        if (!path->empty() && SameFile(*path, options.fPlanPath)) {
-            throw HostError(*path + ": this is the plan file; choose another output file");
-        }
-    }
+    CheckOutputFiles({{"plan file", options.fPlanPath}, {"model file", modelPath}},
+                     {{"--cases-out", options.fCasesOut}, {"--json", options.fJsonPath}});
 }
 
 //! The plan, completed against the variables built from it and the model, with its model.
@@ -384,14 +366,21 @@ SimulationReport MakeReport(const SimulateOptions& options, const PreparedPlan& 
 
 //! Puts the output files in place, both or neither: the JSON text waits in its temporary file
 //! until the case file is in place, and the case file goes again if the JSON file fails.
-void CommitOutputs(const SimulateOptions& options, const SimulationReport& report,
-                   AtomicFileWriter* json, CsvCaseSink* sink, std::ostream& out) {
+//! False, with nothing written, when an interrupt came before the files were put in place.
+bool CommitOutputs(const SimulateOptions& options, const SimulationReport& report,
+                   AtomicFileWriter* json, CsvCaseSink* sink, InterruptWatcher& interrupt,
+                   std::ostream& out) {
     if (json) {
         // Texts from the plan that are not valid UTF-8 get the replacement character.
         json->GetStream() << ReportToJson(report).dump(2, ' ', false,
                                                        nlohmann::json::error_handler_t::replace)
                           << "\n";
     }
+    OutputCommitScope commits;
+    if (interrupt.IsCancelled()) {
+        return false;
+    }
+    interrupt.Finish();
     if (sink && !sink->Commit()) {
         throw HostError("--cases-out: " + sink->GetError());
     }
@@ -407,6 +396,7 @@ void CommitOutputs(const SimulateOptions& options, const SimulationReport& repor
     if (json) {
         out << (sink ? "" : "\n") << "results written to " << options.fJsonPath << "\n";
     }
+    return true;
 }
 
 } // namespace
@@ -423,14 +413,14 @@ CLI::App* AddSimulateCommand(CLI::App& app, SimulateOptions& options) {
                     "plan's folder)");
     sim->add_option("--cases", options.fCases,
                     "Cases to simulate per iteration (default: the plan's)")
-        ->check(CLI::Range(1, 2000000000));
+        ->transform(WholeNumber(1, 2000000000));
     sim->add_option("--seed", options.fSeed,
                     "Seed of the random stream (default " + std::to_string(kDefaultSeed) + ")")
-        ->check(CLI::Range(std::int64_t{0}, std::int64_t{4294967295}));
+        ->transform(WholeNumber(0, 4294967295));
     sim->add_option("--threads", options.fThreads,
                     "Worker threads (0: one per processor); the results depend on the seed, "
                     "the cases and this number")
-        ->check(CLI::Range(0, 1024))
+        ->transform(WholeNumber(0, 1024))
         ->capture_default_str();
     sim->add_option("--ci", options.fCiLevel,
                     "Confidence level of the intervals of the means, between 0 and 1")
@@ -447,7 +437,7 @@ CLI::App* AddSimulateCommand(CLI::App& app, SimulateOptions& options) {
     sim->add_option("--tornado-delta", options.fTornadoDelta,
                     "Tornado measure: the mean change of each target when an input moves by "
                     "this many of its standard deviations")
-        ->check(CLI::PositiveNumber);
+        ->check(PositiveUpTo(100.0));
     sim->add_flag("--variance", options.fbVariance,
                   "Contribution of each input to each target's variance");
     sim->add_option("--percentiles", options.fvPercentiles,
@@ -466,8 +456,16 @@ int RunSimulate(const SimulateOptions& options, std::ostream& out, std::ostream&
     ProgressBar progress(options.fbProgress);
     AssertionScope assertions;
     try {
-        CheckOptions(options);
+        CheckOptions(options, options.fModelPath);
         PreparedPlan prepared = PreparePlan(options);
+        if (options.fModelPath.empty()) {
+            CheckOptions(options, prepared.fModelPath);
+        }
+        if (interrupt.IsCancelled()) {
+            err << "mcsim: interrupted while reading the plan; nothing was simulated or "
+                   "written\n";
+            return ExitStatus::kInterrupted;
+        }
         const SPCSettings& plan = prepared.fPlan;
         FormulaScoreFactory& factory = *prepared.fpFactory;
 
@@ -482,7 +480,6 @@ int RunSimulate(const SimulateOptions& options, std::ostream& out, std::ostream&
         }
         std::unique_ptr<CsvCaseSink> sink;
         if (!options.fCasesOut.empty()) {
-            CheckWritable(options.fCasesOut, "--cases-out");
             sink = std::make_unique<CsvCaseSink>(options.fCasesOut, InputColumns(*prepared.fpDict));
             for (const FormulaTarget& t : factory.GetModel().GetTargets()) {
                 if (t.fbCategorical) {
@@ -537,7 +534,7 @@ int RunSimulate(const SimulateOptions& options, std::ostream& out, std::ostream&
             if (cancelled) {
                 err << "mcsim: simulation interrupted before any results; nothing was "
                        "written\n";
-                return 130;
+                return ExitStatus::kInterrupted;
             }
             err << "mcsim: the simulation produced no results (code " << resultStatus.GetErrorCode()
                 << ")\n";
@@ -554,10 +551,14 @@ int RunSimulate(const SimulateOptions& options, std::ostream& out, std::ostream&
             }
             err << "mcsim: simulation interrupted after " << done
                 << " cases; the results above are partial and no file was written\n";
-            return 130;
+            return ExitStatus::kInterrupted;
         }
-        CommitOutputs(options, report, json.get(), sink.get(), out);
-        return 0;
+        if (!CommitOutputs(options, report, json.get(), sink.get(), interrupt, out)) {
+            err << "mcsim: interrupted while the results were reported; they are complete "
+                   "above, but no file was written\n";
+            return ExitStatus::kInterrupted;
+        }
+        return ExitStatus::kDone;
     } catch (...) {
         return ReportCommandFailure(progress, err);
     }

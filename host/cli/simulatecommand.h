@@ -38,9 +38,10 @@ struct SimulateOptions {
 //! Adds the `simulate` subcommand to `app`, storing into `options`; returns it.
 CLI::App* AddSimulateCommand(CLI::App& app, SimulateOptions& options);
 
-//! Runs the simulation. The report goes to `out`, messages to `err`. Returns the exit status:
-//! 0 done, 1 failed (the message names the file, line or field), 130 interrupted (the partial
-//! results are printed, no file is written).
+//! Runs the simulation. The report goes to `out`, messages to `err`. Returns the exit status
+//! (cli/commandline.h): 0 done, 1 failed (the message names the file, line or field), 2 a
+//! usage error found before the run, 130 interrupted (the results so far are printed, no file
+//! is written).
 int RunSimulate(const SimulateOptions& options, std::ostream& out, std::ostream& err);
 
 } // namespace MCHost

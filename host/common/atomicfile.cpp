@@ -5,7 +5,9 @@
 #include <atomic>
 #include <cerrno>
 #include <cstdio>
+#include <cstdlib>
 #include <cstring>
+#include <set>
 
 #include <unistd.h>
 
@@ -21,11 +23,43 @@ std::string TemporaryName(const std::string& path) {
            std::to_string(counter.fetch_add(1));
 }
 
+//! Guards the renames of a commit and the set of uncommitted temporary files. Recursive: a
+//! writer's Commit takes it again inside a command's OutputCommitScope.
+std::recursive_mutex& CommitMutex() {
+    static std::recursive_mutex mutex;
+    return mutex;
+}
+
+//! The temporary files of the writers not yet committed or aborted.
+std::set<std::string>& Uncommitted() {
+    static std::set<std::string> files;
+    return files;
+}
+
 } // namespace
+
+OutputCommitScope::OutputCommitScope() : fLock(CommitMutex()) {}
+
+void RemoveUncommittedFilesAndExit(int status, const char* message) {
+    // Kept locked until the process ends, so no rename follows the removal.
+    CommitMutex().lock();
+    for (const std::string& path : Uncommitted()) {
+        std::remove(path.c_str());
+    }
+    std::fputs(message, stderr);
+    std::fflush(stderr);
+    std::_Exit(status);
+}
 
 AtomicFileWriter::AtomicFileWriter(std::string path)
     : fPath(std::move(path)), fTempPath(TemporaryName(fPath)) {
-    fStream.open(fTempPath, std::ios::out | std::ios::trunc | std::ios::binary);
+    {
+        std::lock_guard<std::recursive_mutex> guard(CommitMutex());
+        fStream.open(fTempPath, std::ios::out | std::ios::trunc | std::ios::binary);
+        if (fStream.is_open()) {
+            Uncommitted().insert(fTempPath);
+        }
+    }
     if (!fStream.is_open()) {
         fError = LocatedMessage(fPath, 0,
                                 std::string("cannot create the file: ") + std::strerror(errno));
@@ -48,6 +82,8 @@ bool AtomicFileWriter::Commit() {
     fStream.flush();
     const bool written = fStream.good();
     fStream.close();
+    std::lock_guard<std::recursive_mutex> guard(CommitMutex());
+    Uncommitted().erase(fTempPath);
     if (!written || fStream.fail()) {
         fError = LocatedMessage(fPath, 0, "writing the file failed (disk full?)");
         std::remove(fTempPath.c_str());
@@ -68,6 +104,8 @@ void AtomicFileWriter::Abort() {
     }
     fbDone = true;
     fStream.close();
+    std::lock_guard<std::recursive_mutex> guard(CommitMutex());
+    Uncommitted().erase(fTempPath);
     std::remove(fTempPath.c_str());
 }
 

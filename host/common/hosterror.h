@@ -18,6 +18,13 @@ public:
     explicit HostError(const std::string& message) : std::runtime_error(message) {}
 };
 
+//! A command line that cannot be run as given (a bad option value, an output file that would
+//! replace an input): the command ends with the usage status, 2, before doing any work.
+class UsageError : public HostError {
+public:
+    explicit UsageError(const std::string& message) : HostError(message) {}
+};
+
 //! "file:line: text", or "file: text" when `line` is below 1.
 std::string LocatedMessage(const std::string& file, long line, const std::string& text);
 

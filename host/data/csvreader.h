@@ -8,11 +8,17 @@
 // quoted field that never closes, a character other than a delimiter or a line end right
 // after a closing quote, and a field longer than kMaxFieldBytes (almost always an unbalanced
 // quote swallowing the rest of the file).
+//
+// With a decimal comma, a field that reads as a number written with a comma for the decimal
+// point ("-3,14", "2,5e3") is handed out with a point instead, so the layers above read numbers
+// one way. GuessSeparator picks the separator of a file from its first rows when the user
+// names none.
 #pragma once
 
 #include <cstdint>
 #include <istream>
 #include <string>
+#include <string_view>
 #include <vector>
 
 namespace MCHost {
@@ -27,7 +33,9 @@ public:
     //! Reads from `in` (which must outlive the reader), naming `fileName` in messages. A
     //! byte-order mark at the current position of `in` is skipped. The reader takes the stream
     //! in blocks of kBufferBytes, so the stream's own position runs ahead of the records read.
-    CsvReader(std::istream& in, std::string fileName, char delimiter = ',');
+    //! With `decimalComma`, numbers written with a decimal comma are handed out with a point.
+    CsvReader(std::istream& in, std::string fileName, char delimiter = ',',
+              bool decimalComma = false);
 
     //! Reads the next record into `fields`, which then holds exactly the record's fields (the
     //! strings already there are reused, so a loop over records allocates little). False, with
@@ -68,10 +76,13 @@ private:
     void AppendRun(std::string& field, bool quoted, long fieldLine);
     //! Throws the message for a field beyond kMaxFieldBytes that began on `fieldLine`.
     [[noreturn]] void ThrowFieldTooLong(long fieldLine) const;
+    //! Writes the decimal commas of the first `n` fields that read as numbers as points.
+    void PointDecimalCommas(std::vector<std::string>& fields, std::size_t n) const;
 
     std::streambuf* fpBuf;           //!< the stream's buffer, read in blocks
     std::string fFileName;           //!< named in messages
     char fDelimiter;                 //!< field separator
+    bool fbDecimalComma;             //!< numbers are written with a decimal comma
     std::vector<char> fvBuffer;      //!< the block being read
     std::size_t fPos = 0;            //!< next unread byte of fvBuffer
     std::size_t fEnd = 0;            //!< bytes of fvBuffer filled
@@ -79,5 +90,42 @@ private:
     long fRecordLine = 0;            //!< line where the last record began
     std::uint64_t fBytesFetched = 0; //!< bytes taken from the stream, the byte-order mark included
 };
+
+//! True when `text`, without surrounding blanks, is a number written with a decimal comma:
+//! a sign, digits with one comma among or before them, and an exponent ("-0,5", ",25", "1,5e-3").
+bool IsDecimalCommaNumber(std::string_view text);
+
+//! The separators GuessSeparator tries, in the order a tie is settled.
+inline constexpr char kSeparatorCandidates[] = {',', ';', '\t', '|'};
+//! Bytes of the start of a file that GuessSeparator looks at.
+inline constexpr std::size_t kSeparatorSampleBytes = 64u << 10;
+//! Rows after the header that GuessSeparator looks at.
+inline constexpr int kSeparatorSampleRows = 50;
+
+//! What the start of a CSV file says about its separator.
+struct SeparatorGuess {
+    //! The candidate that splits the header into the most fields, two or more, and every
+    //! sampled row into as many; the first candidate when none does.
+    char fDelimiter = ',';
+    bool fbFound = false; //!< a candidate split the sample that evenly
+    //! A cell of the sample, read with fDelimiter, that is a number written with a decimal
+    //! comma ("3,14"); "" when there is none.
+    std::string fDecimalCommaCell;
+    //! A candidate other than fDelimiter that the header holds when fDelimiter reads it as one
+    //! field (a sign that the separator is another); 0 when none.
+    char fInOneFieldHeader = 0;
+};
+
+//! Guesses the separator of the file whose first bytes are `sample` (at most
+//! kSeparatorSampleBytes; a last row cut off by the sample's end is not looked at) among
+//! `candidates`, in order.
+SeparatorGuess GuessSeparator(const std::string& sample, std::string_view candidates);
+
+//! The first kSeparatorSampleBytes of `path` for GuessSeparator; "" when the file cannot be
+//! opened or is not a regular file (a pipe cannot be read twice).
+std::string ReadSeparatorSample(const std::string& path);
+
+//! How a separator is named in messages: ';' or 'tab'.
+std::string SeparatorName(char delimiter);
 
 } // namespace MCHost

@@ -36,7 +36,8 @@ bool CsvRecordIter::Open() {
     }
     std::error_code ec;
     fFileBytes = std::filesystem::file_size(path, ec);
-    fpReader = std::make_unique<CsvReader>(fIn, path, fDictionary.GetDelimiter());
+    fpReader = std::make_unique<CsvReader>(fIn, path, fDictionary.GetDelimiter(),
+                                           fDictionary.HasDecimalComma());
     try {
         if (!fpReader->ReadRecord(fvCells)) {
             fError = LocatedMessage(path, 0, "the header row has gone (did the file change?)");

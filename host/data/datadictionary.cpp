@@ -453,11 +453,12 @@ DataDictionary DataDictionary::Build(const std::string& path, const DataOptions&
     OpenData(path, in);
     std::error_code ec;
     const std::uint64_t fileBytes = std::filesystem::file_size(path, ec);
-    CsvReader reader(in, path, options.fDelimiter);
+    CsvReader reader(in, path, options.fDelimiter, options.fbDecimalComma);
 
     DataDictionary dict;
     dict.fPath = path;
     dict.fDelimiter = options.fDelimiter;
+    dict.fbDecimalComma = options.fbDecimalComma;
 
     // The header: one distinct, non-empty name per column.
     std::vector<std::string> header;

@@ -49,7 +49,8 @@ std::string MeasureLevelName(MCSPConst::MeasureLevel level);
 
 //! What the reader is told about a CSV file.
 struct DataOptions {
-    char fDelimiter = ','; //!< field separator
+    char fDelimiter = ',';       //!< field separator
+    bool fbDecimalComma = false; //!< numbers are written with a decimal comma ("3,14")
     //! Columns to use, by header name, in any order; empty: every column. The variables keep
     //! the file's column order.
     std::vector<std::string> fvFields;
@@ -88,6 +89,7 @@ public:
 
     const std::string& GetPath() const { return fPath; }
     char GetDelimiter() const { return fDelimiter; }
+    bool HasDecimalComma() const { return fbDecimalComma; }
     //! Number of columns of the header, used or not.
     int GetNColumns() const { return fNColumns; }
     //! Number of data rows.
@@ -123,6 +125,7 @@ private:
 
     std::string fPath;               //!< the file
     char fDelimiter = ',';           //!< its separator
+    bool fbDecimalComma = false;     //!< its numbers have a decimal comma
     int fNColumns = 0;               //!< header columns
     std::int64_t fNRows = 0;         //!< data rows
     std::uint64_t fFileBytes = 0;    //!< bytes read by Build

@@ -315,3 +315,48 @@ TEST(CsvReader, BytesReadCountRecordsNotTheBlockReadAhead) {
 }
 
 } // namespace
+
+//! The start of a file and what GuessSeparator must make of it among the four candidates.
+struct SeparatorCase {
+    const char* name;
+    std::string sample;
+    char delimiter;          //!< expected separator
+    bool found;              //!< it split every sampled row evenly
+    std::string decimalCell; //!< expected decimal-comma cell
+    char inOneFieldHeader;   //!< expected other separator in a one-field header
+};
+
+class GuessSeparatorTable : public ::testing::TestWithParam<SeparatorCase> {};
+
+TEST_P(GuessSeparatorTable, PicksTheSeparatorThatSplitsEveryRowAlike) {
+    const SeparatorCase& c = GetParam();
+    const MCHost::SeparatorGuess guess = MCHost::GuessSeparator(c.sample, ",;\t|");
+    EXPECT_EQ(guess.fDelimiter, c.delimiter);
+    EXPECT_EQ(guess.fbFound, c.found);
+    EXPECT_EQ(guess.fDecimalCommaCell, c.decimalCell);
+    EXPECT_EQ(guess.fInOneFieldHeader, c.inOneFieldHeader);
+}
+
+INSTANTIATE_TEST_SUITE_P(
+    Samples, GuessSeparatorTable,
+    ::testing::Values(
+        SeparatorCase{"Comma", "a,b\n1,2\n", ',', true, "", 0},
+        SeparatorCase{"SemicolonWithDecimalCommas", "a;b\n1,5;-2,25\n3;4\n", ';', true, "1,5", 0},
+        SeparatorCase{"Tab", "a\tb\tc\n1\t2,5\t3\n", '\t', true, "2,5", 0},
+        SeparatorCase{"PipeBeatsTheCommaInsideQuotes", "a|b\n\"x,y\"|2\n", '|', true, "", 0},
+        // A comma inside every text splits the rows, but not the header, evenly.
+        SeparatorCase{"UnevenRowsAreNoSeparator", "name;n\nSmith, J;1\nLee, K;2\n", ';', true, "",
+                      0},
+        SeparatorCase{"NoCandidateFits", "a;b\n1;2;3\n", ',', false, "", ';'},
+        // The row cut off by the end of the sample does not count.
+        SeparatorCase{"CutRowIgnored",
+                      "a;b\n" + std::string(MCHost::kSeparatorSampleBytes - 8, 'x') + ";1\n2;3;4",
+                      ';', true, "", 0}),
+    [](const auto& p) { return std::string(p.param.name); });
+
+TEST(CsvReader, DecimalCommasOfNumbersOnlyBecomePoints) {
+    std::istringstream in("a;b;c\n1,5;-,25e3;x,y\n\"2,0\";1,2,3; 7 \n");
+    CsvReader reader(in, "d.csv", ';', true);
+    EXPECT_EQ(ReadAll(reader).rows,
+              (Rows{{"a", "b", "c"}, {"1.5", "-.25e3", "x,y"}, {"2.0", "1,2,3", " 7 "}}));
+}

@@ -9,6 +9,7 @@
 #include <filesystem>
 #include <fstream>
 #include <iterator>
+#include <map>
 #include <sstream>
 #include <string>
 #include <vector>
@@ -62,6 +63,19 @@ inline std::string ReadFile(const std::string& path) {
     std::ostringstream os;
     os << in.rdbuf();
     return os.str();
+}
+
+//! Every file of `dir` (its captured standard error, stderr.txt, aside) with its content: equal
+//! snapshots before and after a run mean the inputs are untouched and nothing was left behind.
+inline std::map<std::string, std::string> Snapshot(const TempDir& dir) {
+    std::map<std::string, std::string> files;
+    for (const auto& entry : std::filesystem::recursive_directory_iterator(dir.Path())) {
+        const std::string name = entry.path().lexically_relative(dir.Path()).string();
+        if (name != "stderr.txt") {
+            files[name] = entry.is_regular_file() ? ReadFile(entry.path().string()) : "<dir>";
+        }
+    }
+    return files;
 }
 
 //! What one run of the mcsim command did.

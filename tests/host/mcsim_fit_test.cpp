@@ -114,7 +114,7 @@ TEST(McsimFit, WeightLevelsAndFieldChoice) {
     hosttest::TempDir dir;
     const CommandRun run =
         Mcsim({"fit", kSales, "--fields", "unit_price,returns", "--weight", "satisfaction",
-               "--level", "returns=continuous", "--cases", "100"},
+               "--level", "returns=continuous", "--cases", "1e2"},
               dir);
     ASSERT_EQ(run.status, 0) << run.err;
     EXPECT_NE(run.out.find("fitted 2 fields"), std::string::npos) << run.out;
@@ -124,13 +124,37 @@ TEST(McsimFit, WeightLevelsAndFieldChoice) {
     EXPECT_EQ(run.out.find("\nregion"), std::string::npos) << run.out;
 }
 
+TEST(McsimFit, FindsTheSeparatorAndReadsDecimalCommas) {
+    hosttest::TempDir dir;
+    std::string text = "price;region\n";
+    for (int i = 0; i < 40; ++i) {
+        text += std::to_string(10 + i % 7) + "," + std::to_string(i % 10) + ";" +
+                (i % 3 == 0 ? "north" : "south") + "\n";
+    }
+    const std::string path = dir.Write("semi.csv", text);
+    const CommandRun asText = Mcsim({"fit", path}, dir);
+    ASSERT_EQ(asText.status, 0) << asText.err;
+    EXPECT_NE(asText.out.find("(separator ';', found in its first rows)"), std::string::npos)
+        << asText.out;
+    EXPECT_NE(asText.out.find("\nprice  (categorical"), std::string::npos) << asText.out;
+    EXPECT_NE(asText.err.find("cells such as '10,0' are read as text; give --decimal-comma"),
+              std::string::npos)
+        << asText.err;
+    const CommandRun numbers = Mcsim({"fit", path, "--decimal-comma"}, dir);
+    ASSERT_EQ(numbers.status, 0) << numbers.err;
+    EXPECT_NE(numbers.out.find("\nprice  (continuous)"), std::string::npos) << numbers.out;
+    EXPECT_EQ(numbers.err, "");
+}
+
 TEST(McsimFit, HelpForTheCommandAndTheSubcommand) {
     hosttest::TempDir dir;
     const CommandRun top = Mcsim({"--help"}, dir);
     EXPECT_EQ(top.status, 0);
     EXPECT_NE(top.out.find("fit"), std::string::npos);
+    EXPECT_NE(top.out.find("Exit status: 0 done; 1"), std::string::npos) << top.out;
     const CommandRun fit = Mcsim({"fit", "--help"}, dir);
     EXPECT_EQ(fit.status, 0);
+    EXPECT_NE(fit.out.find("130, 143, 129 interrupted"), std::string::npos) << fit.out;
     for (const char* option : {"--fields", "--factors", "--weight", "--level", "--test",
                                "--crosstabs", "--cases", "--bins", "--threads"}) {
         EXPECT_NE(fit.out.find(option), std::string::npos) << option;
@@ -140,9 +164,10 @@ TEST(McsimFit, HelpForTheCommandAndTheSubcommand) {
 struct BadRun {
     const char* name;
     std::string data;                 //!< content of the data file ("" : the example file)
-    std::vector<std::string> options; //!< after `fit FILE`
+    std::vector<std::string> options; //!< after `fit FILE`; "@NAME" is the file NAME of the test
     const char* what;                 //!< words of the message on standard error
     std::string model = "";           //!< a model file to record in a plan, "" none
+    int status = 1;                   //!< exit status: 1 bad input, 2 usage error
 };
 
 class McsimFitErrors : public ::testing::TestWithParam<BadRun> {};
@@ -152,15 +177,18 @@ TEST_P(McsimFitErrors, OneMessageAndFailure) {
     hosttest::TempDir dir;
     const std::string path = c.data.empty() ? kSales : dir.Write("in.csv", c.data);
     std::vector<std::string> args = {"fit", path};
-    args.insert(args.end(), c.options.begin(), c.options.end());
+    for (const std::string& option : c.options) {
+        args.push_back(option[0] == '@' ? dir.File(option.substr(1)) : option);
+    }
     if (!c.model.empty()) {
         args.insert(args.end(),
                     {"-o", dir.File("plan.xml"), "--model", dir.Write("m.model", c.model)});
     }
+    const auto before = hosttest::Snapshot(dir);
     const CommandRun run = Mcsim(args, dir);
-    EXPECT_EQ(run.status, 1) << run.out;
+    EXPECT_EQ(run.status, c.status) << run.out;
     EXPECT_EQ(run.out, "");
-    EXPECT_FALSE(std::filesystem::exists(dir.File("plan.xml")));
+    EXPECT_EQ(hosttest::Snapshot(dir), before) << "an input changed or an output was left";
     EXPECT_EQ(run.err.rfind("mcsim: ", 0), 0u) << run.err;
     EXPECT_NE(run.err.find(c.what), std::string::npos) << run.err;
     EXPECT_EQ(std::count(run.err.begin(), run.err.end(), '\n'), 1) << run.err;
@@ -179,7 +207,6 @@ INSTANTIATE_TEST_SUITE_P(
                {"--weight", "returns", "--level", "returns=categorical"},
                "is categorical"},
         BadRun{"TextAsContinuous", "", {"--level", "store=continuous"}, "can only be categorical"},
-        BadRun{"BadLevel", "", {"--level", "store=fuzzy"}, "--level store=fuzzy"},
         BadRun{"WeightFitted",
                "",
                {"--fields", "unit_price", "--factors", "region", "--weight", "region"},
@@ -196,7 +223,45 @@ INSTANTIATE_TEST_SUITE_P(
                {"--targets", "zz"},
                "does not define",
                "a = unit_price * 2\n"},
-        BadRun{"ModelWithoutPlan", "", {"--model", "m.model"}, "add -o PLAN.xml"}),
+        BadRun{"OneFieldHeaderHoldingAnotherSeparator",
+               "a;b\n1,5;2\n",
+               {"--delimiter", ","},
+               "the row has 2 fields, the header has 1; the header reads as one field holding "
+               "';': if that separates the fields, give --delimiter ';'"},
+        // Usage errors: found before the data is read.
+        BadRun{"ModelWithoutPlan", "", {"--model", "m.model"}, "add -o PLAN.xml", "", 2},
+        BadRun{"BadLevel", "", {"--level", "store=fuzzy"}, "--level store=fuzzy", "", 2},
+        BadRun{"UnknownOption", "", {"--bogus"}, "--bogus; see 'mcsim fit --help'", "", 2},
+        BadRun{"BinsOutOfRange",
+               "",
+               {"--bins", "1"},
+               "--bins: 1 is out of range; expected a whole number from 2 to 100000",
+               "",
+               2},
+        BadRun{"DecimalCommaAndCommaSeparator",
+               "",
+               {"--decimal-comma", "--delimiter", ","},
+               "--decimal-comma: the comma cannot be the decimal mark and the separator",
+               "",
+               2},
+        BadRun{"PlanOverTheData",
+               "a,b\n1,2\n3,4\n",
+               {"-o", "@in.csv"},
+               "in.csv: this is the data file; choose another output file",
+               "",
+               2},
+        BadRun{"TwoOutputsOneFile",
+               "",
+               {"-o", "@p.xml", "--fit-stats", "@p.xml"},
+               "p.xml: this file is written by -o already",
+               "",
+               2},
+        BadRun{"NoSuchFolder",
+               "",
+               {"-o", "@nodir/p.xml"},
+               "nodir/p.xml: cannot create the file",
+               "",
+               2}),
     [](const auto& p) { return std::string(p.param.name); });
 
 TEST(McsimFit, WritesAPlanThatReadsBack) {
@@ -253,14 +318,6 @@ TEST(McsimFit, AFieldWithoutAFitIsLeftOutOfThePlan) {
     ASSERT_TRUE(handler.ParsePlanFile(hosttest::ReadFile(plan), pRead));
     EXPECT_EQ(read.GetSimInput("tier"), nullptr);
     EXPECT_FALSE(read.GetSimulationInput().empty());
-}
-
-TEST(McsimFit, UnwritablePlanIsReported) {
-    hosttest::TempDir dir;
-    const CommandRun run = Mcsim({"fit", kSales, "-o", "/no/such/folder/plan.xml"}, dir);
-    EXPECT_EQ(run.status, 1);
-    EXPECT_NE(run.err.find("/no/such/folder/plan.xml: cannot create"), std::string::npos)
-        << run.err;
 }
 
 TEST(McsimFit, MissingFileIsNamed) {

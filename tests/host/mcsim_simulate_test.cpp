@@ -21,12 +21,18 @@
 #include <boost/math/distributions/normal.hpp>
 
 #include <algorithm>
+#include <chrono>
 #include <cmath>
+#include <csignal>
 #include <cstdio>
 #include <filesystem>
 #include <functional>
 #include <map>
 #include <sstream>
+#include <thread>
+
+#include <fcntl.h>
+#include <spawn.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
@@ -325,7 +331,7 @@ TEST(McsimDemo, RunsTheBundledExampleAndKeepsItsFiles) {
     hosttest::TempDir dir;
     const std::string folder = dir.File("demo");
     const CommandRun run =
-        Mcsim({"demo", "--dir", folder, "--cases", "3000", "--examples", kExamples});
+        Mcsim({"demo", "--dir", folder, "--cases", "3e3", "--examples", kExamples});
     ASSERT_EQ(run.status, 0) << run.err;
     EXPECT_NE(run.out.find("== step 2 of 2"), std::string::npos);
     EXPECT_NE(run.out.find("margin_band  (categorical)"), std::string::npos);
@@ -335,11 +341,13 @@ TEST(McsimDemo, RunsTheBundledExampleAndKeepsItsFiles) {
     EXPECT_TRUE(std::filesystem::exists(folder + "/sales_plan.xml"));
 }
 
-//! One broken input: the files to write, the extra arguments, and the start of the message.
+//! One broken input or misused option: the files to write, the extra arguments, the words of
+//! the message and the exit status.
 struct BadInput {
     std::string fName;                                                        //!< test name
     std::function<std::vector<std::string>(const hosttest::TempDir&)> fSetup; //!< args
     std::string fMessage; //!< expected in the message
+    int fStatus = 1;      //!< 1 bad input, 2 usage error
 };
 
 std::ostream& operator<<(std::ostream& os, const BadInput& b) {
@@ -354,20 +362,86 @@ TEST_P(McsimSimulateBadInput, OneMessageNoOutput) {
     for (const std::string& a : GetParam().fSetup(dir)) {
         args.push_back(a);
     }
-    const std::size_t before = dir.Count();
+    const auto before = hosttest::Snapshot(dir);
     for (const char* option : {"--json", "--cases-out"}) {
         if (std::find(args.begin(), args.end(), option) == args.end()) {
             args.insert(args.end(), {option, dir.File(std::string("out") + option)});
         }
     }
     const CommandRun run = Mcsim(args);
-    EXPECT_EQ(run.status, 1);
+    EXPECT_EQ(run.status, GetParam().fStatus);
     EXPECT_EQ(run.out, "");
     EXPECT_EQ(run.err.find("mcsim: "), 0u) << run.err;
     EXPECT_NE(run.err.find(GetParam().fMessage), std::string::npos) << run.err;
     EXPECT_EQ(std::count(run.err.begin(), run.err.end(), '\n'), 1) << run.err;
-    EXPECT_EQ(dir.Count(), before) << "an output file or a temporary file was left behind";
+    EXPECT_EQ(hosttest::Snapshot(dir), before) << "an input changed or an output was left";
 }
+
+//! The example plan in `dir` followed by `options`.
+std::function<std::vector<std::string>(const hosttest::TempDir&)>
+PlanThen(std::vector<std::string> options) {
+    return [options](const hosttest::TempDir& d) {
+        std::vector<std::string> args{d.Write("plan.xml", DemandPlan())};
+        for (const std::string& o : options) {
+            args.push_back(o[0] == '@' ? d.File(o.substr(1)) : o);
+        }
+        return args;
+    };
+}
+
+//! A signal during a long run ends the command with 128 + the signal and leaves no output
+//! and no temporary file; SIGINT first stops the workers and prints the results so far.
+class McsimSignal : public ::testing::TestWithParam<std::pair<int, int>> {};
+
+TEST_P(McsimSignal, EndsWithItsStatusAndLeavesNoFile) {
+    const auto [signal, status] = GetParam();
+    hosttest::TempDir dir;
+    const std::string plan = dir.Write("plan.xml", DemandPlan());
+    const auto before = hosttest::Snapshot(dir);
+    std::vector<std::string> args{MCSIM_EXE,
+                                  "simulate",
+                                  plan,
+                                  "--cases",
+                                  "2e9",
+                                  "--threads",
+                                  "1",
+                                  "--cases-out",
+                                  dir.File("cases.csv"),
+                                  "--json",
+                                  dir.File("r.json")};
+    std::vector<char*> argv;
+    for (std::string& a : args) {
+        argv.push_back(a.data());
+    }
+    argv.push_back(nullptr);
+    posix_spawn_file_actions_t quiet;
+    ::posix_spawn_file_actions_init(&quiet);
+    ::posix_spawn_file_actions_addopen(&quiet, 1, "/dev/null", O_WRONLY, 0);
+    ::posix_spawn_file_actions_addopen(&quiet, 2, "/dev/null", O_WRONLY, 0);
+    pid_t pid = 0;
+    ASSERT_EQ(::posix_spawn(&pid, MCSIM_EXE, &quiet, nullptr, argv.data(), environ), 0);
+    ::posix_spawn_file_actions_destroy(&quiet);
+    // The cases are being written once the case file's temporary file is there (bounded wait).
+    bool running = false;
+    for (int i = 0; i < 6000 && !running; ++i) {
+        for (const auto& entry : std::filesystem::directory_iterator(dir.Path())) {
+            running = running || entry.path().filename().string().rfind("cases.csv.tmp", 0) == 0;
+        }
+        std::this_thread::sleep_for(std::chrono::milliseconds(10));
+    }
+    ::kill(pid, signal);
+    int raw = 0;
+    ASSERT_EQ(::waitpid(pid, &raw, 0), pid);
+    EXPECT_TRUE(running);
+    ASSERT_TRUE(WIFEXITED(raw)) << "ended by signal " << WTERMSIG(raw);
+    EXPECT_EQ(WEXITSTATUS(raw), status);
+    EXPECT_EQ(hosttest::Snapshot(dir), before) << "an output or temporary file was left";
+}
+
+INSTANTIATE_TEST_SUITE_P(Signals, McsimSignal,
+                         ::testing::Values(std::pair{SIGINT, 130}, std::pair{SIGTERM, 143},
+                                           std::pair{SIGHUP, 129}),
+                         [](const auto& p) { return std::to_string(p.param.first); });
 
 std::vector<std::string> PlanWith(const hosttest::TempDir& dir,
                                   const std::vector<std::pair<std::string, std::string>>& edits) {
@@ -442,12 +516,28 @@ INSTANTIATE_TEST_SUITE_P(
                      return PlanAndModel(d, "unit_margin = price - unit_cost\n");
                  },
                  "the plan names the target 'revenue'"},
-        BadInput{"UnwritableOutput",
+        // Usage errors: found before the plan is simulated.
+        BadInput{"UnknownOption", PlanThen({"--bogus"}), "--bogus; see 'mcsim simulate --help'", 2},
+        BadInput{"CasesNotWhole", PlanThen({"--cases", "2.5"}),
+                 "--cases: 2.5 is not a whole number; expected a whole number from 1 to", 2},
+        BadInput{"PercentileZero", PlanThen({"--percentiles", "5,0"}),
+                 "--percentiles 0: a percentile lies strictly between 0 and 100", 2},
+        BadInput{"TornadoDeltaNan", PlanThen({"--tornado-delta", "nan"}),
+                 "expected a number above 0 and at most 100, not 'nan'", 2},
+        BadInput{"JsonOverThePlan", PlanThen({"--json", "@plan.xml"}),
+                 "plan.xml: this is the plan file; choose another output file", 2},
+        BadInput{"CasesOutIsALinkToTheModel",
                  [](const hosttest::TempDir& d) {
-                     return std::vector<std::string>{d.Write("plan.xml", DemandPlan()), "--json",
-                                                     d.File("no/such/folder/r.json")};
+                     const std::string model = d.Write("m.model", hosttest::ReadFile(kModel));
+                     std::filesystem::create_symlink(model, d.File("link.csv"));
+                     return std::vector<std::string>{d.Write("plan.xml", DemandPlan()), "--model",
+                                                     model, "--cases-out", d.File("link.csv")};
                  },
-                 "--json: "}),
+                 "link.csv: this is the model file", 2},
+        BadInput{"TwoOutputsOneFile", PlanThen({"--json", "@r.out", "--cases-out", "@r.out"}),
+                 "r.out: this file is written by --cases-out already", 2},
+        BadInput{"UnwritableOutput", PlanThen({"--json", "@no/such/folder/r.json"}),
+                 "r.json: cannot create the file", 2}),
     [](const ::testing::TestParamInfo<BadInput>& p) { return p.param.fName; });
 
 } // namespace
