@@ -298,7 +298,7 @@ void DFCAlgorithm::UpdateCovariateChecks() {
         if (failed != 0) {
             for (int k = 0; k < kNFitDistTypes; ++k) {
                 if (failed & Bit(static_cast<DistType>(k))) {
-                    DropCovarDist(i, static_cast<DistType>(k));
+                    DropCovarDist(i, static_cast<DistType>(k), kDropSupport);
                 }
             }
             if (failed & kDiscreteMarkTypes) {
@@ -326,9 +326,11 @@ void DFCAlgorithm::UpdateCovariateChecks() {
     }
 }
 
-void DFCAlgorithm::DropCovarDist(int covariate, DistType type) {
+void DFCAlgorithm::DropCovarDist(int covariate, DistType type, DFCDropReason reason) {
     fvAllowedMask[static_cast<std::size_t>(covariate)] &= static_cast<std::uint16_t>(~Bit(type));
-    GetOutCovarDistInfo(covariate, type).fbDistAllowed = false;
+    DFCOutputStats::DFCVarDistElement& element = GetOutCovarDistInfo(covariate, type);
+    element.fbDistAllowed = false;
+    element.fDropReason = reason;
     fWarnings.AddWarning(MCStatus(MCSPStatus::kDistDropped, true), 0);
 }
 
@@ -444,20 +446,28 @@ void DFCAlgorithm::FinishFirstPass() {
         if (!std::isfinite(fvRanges[ui])) {
             for (const DistType type : {kDistTriangular, kDistUniform}) {
                 if (fvAllowedMask[ui] & Bit(type)) {
-                    DropCovarDist(i, type);
+                    DropCovarDist(i, type, kDropRangeOverflow);
                 }
             }
         }
         const std::uint16_t mask = fvAllowedMask[ui];
         // A binomial's variance n·p·(1-p) is below its mean n·p.
         if ((mask & Bit(kDistBinomial)) && fvVariances[ui] >= m) {
-            DropCovarDist(i, kDistBinomial);
+            DropCovarDist(i, kDistBinomial, kDropOverDispersion);
+        }
+        // The negative binomial has a maximum-likelihood estimate only when the variance (divisor
+        // W) exceeds the mean (Aragón, Eberly and Eberly 1992, "Existence and uniqueness of the
+        // maximum likelihood estimator for the two-parameter negative binomial distribution",
+        // Stat. Probab. Lett. 15, 375-379); below it the likelihood rises towards the Poisson
+        // limit r → ∞, and any finite estimate would be an arbitrary point on the way.
+        if ((mask & Bit(kDistNegbinomial)) && maximum > minimum && !(fvVariancesW[ui] > m)) {
+            DropCovarDist(i, kDistNegbinomial, kDropUnderDispersion);
         }
         // Triangular moment match: mean = (min + max + mode)/3, so with the range r the mode
         // lies at min + r·t, t = 3·(mean - min)/r - 1, clamped to [min, max].
         if (mask & Bit(kDistTriangular)) {
             if (fvRanges[ui] == 0.0) {
-                DropCovarDist(i, kDistTriangular);
+                DropCovarDist(i, kDistTriangular, kDropNoVariance);
             } else {
                 const double t = 3.0 * (m - minimum) / fvRanges[ui] - 1.0;
                 fvModes[ui] =

@@ -145,8 +145,8 @@ private:
     bool GetRecordValues(const MCXML_800::Record& record, bool update);
     //! Support checks, extremes and log sums of one valid record (first pass).
     void UpdateCovariateChecks();
-    //! Clears the element of (covariate, type) and adds warning 390004.
-    void DropCovarDist(int covariate, MCSPConst::DistType type);
+    //! Clears the element of (covariate, type), records `reason` in it and adds warning 390004.
+    void DropCovarDist(int covariate, MCSPConst::DistType type, DFCDropReason reason);
     //! The two descriptive passes.
     MCStatus ComputeBasicStats(MCCommon_800::MultiPassRecordIter& trainData);
     //! One pass over at most the case limit of records; `onValid` runs for each valid one.

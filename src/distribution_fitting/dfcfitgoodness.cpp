@@ -33,6 +33,11 @@ using namespace MCSPConst;
 namespace {
 
 constexpr double kMissing = MCMV::Missing();
+//! ln √(2π).
+constexpr double kLnSqrtTwoPi = 0.91893853320467274178;
+//! Weight of the values strictly inside the fitted support below which A² and D are not
+//! computed: with less there is no EDF to compare.
+constexpr double kMinEdfWeight = 2.0;
 //! Expected bin counts below this make the chi-square approximation doubtful (Cochran 1954).
 constexpr double kMinExpected = 5.0;
 //! A best fit whose p-value is below this is reported as a poor fit.
@@ -104,6 +109,60 @@ private:
     std::vector<double> fParams;    //!< the candidate's parameters
     const MCSPDistFamily* fpFamily; //!< its row of the family table
     bool fbValid = false;           //!< the parameters are inside the family's domain
+};
+
+//! Pearson's statistic over pooled bins (Cochran 1954, "Some methods for strengthening the
+//! common χ² tests", Biometrics 10, 417-451): adjacent bins are merged from the lowest value
+//! upwards until the group's expected count reaches kMinExpected; a last group short of it joins
+//! the group before it. Bins are added in order; the last closed group is held back so that the
+//! short remainder can still join it.
+class DFCChiSquarePooling {
+public:
+    void Add(double observed, double expected) {
+        fOpenO += observed;
+        fOpenE += expected;
+        if (fOpenE >= kMinExpected) {
+            Close();
+        }
+    }
+    //! The statistic; `nGroups` receives the number of groups.
+    double Finish(int& nGroups) {
+        if (fOpenE > 0.0 || fOpenO > 0.0) {
+            if (fbHeld) {
+                fHeldO += fOpenO;
+                fHeldE += fOpenE;
+            } else {
+                Close();
+            }
+        }
+        if (fbHeld) {
+            fStatistic += Term(fHeldO, fHeldE);
+        }
+        nGroups = fNGroups;
+        return fStatistic;
+    }
+
+private:
+    static double Term(double o, double e) { return (o - e) * (o - e) / e; }
+    void Close() {
+        if (fbHeld) {
+            fStatistic += Term(fHeldO, fHeldE);
+        }
+        fHeldO = fOpenO;
+        fHeldE = fOpenE;
+        fbHeld = true;
+        ++fNGroups;
+        fOpenO = 0.0;
+        fOpenE = 0.0;
+    }
+
+    double fOpenO = 0.0;     //!< observed weight of the open group
+    double fOpenE = 0.0;     //!< its expected count
+    double fHeldO = 0.0;     //!< observed weight of the last closed group
+    double fHeldE = 0.0;     //!< its expected count
+    bool fbHeld = false;     //!< a closed group is held back
+    int fNGroups = 0;        //!< groups closed
+    double fStatistic = 0.0; //!< Σ over the groups before the held one
 };
 
 // ------------------------------------------------------------------------------------------
@@ -265,6 +324,7 @@ DFCChiSquareResult ComputeChiSquareFit(DistType type, const std::vector<double>&
                                               static_cast<std::int64_t>(std::max(upperBins, 1.0)));
     const DFCBinProbabilities probability(type, params);
     double statistic = 0.0;
+    DFCChiSquarePooling pooled;
     for (std::int64_t c = 0; c < nBins; ++c) {
         const double p = probability(c, c == nBins - 1);
         if (!(p > 0.0)) {
@@ -281,12 +341,95 @@ DFCChiSquareResult ComputeChiSquareFit(DistType type, const std::vector<double>&
                                     : 0.0;
         const double diff = observed - expected;
         statistic += diff * diff / expected;
+        pooled.Add(observed, expected);
     }
     result.fNBins = static_cast<int>(nBins);
     result.fStatistic = Finite(statistic);
     result.fDegreesOfFreedom = upper - 1.0 - nEstimated;
     result.fPValue = ChiSquareUpperTail(result.fStatistic, result.fDegreesOfFreedom);
+    if (!MCMV::IsMissing(result.fStatistic)) {
+        result.fPooledStatistic = Finite(pooled.Finish(result.fNPooledBins));
+        result.fPooledDegreesOfFreedom = result.fNPooledBins - 1.0 - nEstimated;
+        result.fPooledPValue =
+            ChiSquareUpperTail(result.fPooledStatistic, result.fPooledDegreesOfFreedom);
+    }
     return result;
+}
+
+double ComputeCountLogLikelihood(DistType type, const std::vector<double>& params,
+                                 const std::vector<double>& counts) {
+    const MCSPDistFamily* family = MCSPFindDistFamily(type);
+    if (family == nullptr || !family->fbDiscrete || !family->HasDensity(params)) {
+        return kMissing;
+    }
+    double sum = 0.0;
+    for (std::size_t c = 0; c < counts.size(); ++c) {
+        if (counts[c] > 0.0) {
+            const double lnP = family->fLogDensity(params.data(), static_cast<double>(c));
+            if (MCMV::IsMissing(lnP)) {
+                return kMissing;
+            }
+            sum += counts[c] * lnP;
+        }
+    }
+    return sum;
+}
+
+// ------------------------------------------------------------------------------------------
+// Likelihood and information criteria
+//
+// ln L = Σ w_i·ln f(x_i) with frequency weights (integer weights equal repeated rows), n = W;
+// AIC = 2k - 2·ln L (Akaike 1974), BIC = k·ln n - 2·ln L (Schwarz 1978), AICc = AIC +
+// 2k(k + 1)/(n - k - 1) (Hurvich and Tsai 1989), k the number of parameters estimated from the
+// data. These are the definitions of fitdistrplus's gofstat and logLik as well.
+
+DFCInfoCriteria ComputeInfoCriteria(double logLik, int k, double n) {
+    DFCInfoCriteria out{kMissing, kMissing, kMissing};
+    if (MCMV::IsMissing(logLik) || !std::isfinite(logLik) || !(n > 0.0)) {
+        return out;
+    }
+    const double kd = static_cast<double>(k);
+    out.fAIC = 2.0 * kd - 2.0 * logLik;
+    out.fBIC = kd * std::log(n) - 2.0 * logLik;
+    if (n - kd - 1.0 > 0.0) {
+        out.fAICc = out.fAIC + 2.0 * kd * (kd + 1.0) / (n - kd - 1.0);
+    }
+    return out;
+}
+
+int CountEstimatedParams(DistType type, const std::vector<double>& params) {
+    switch (type) {
+    case kDistPoisson:
+    case kDistExponential:
+    case kDistBernoulli:
+        return 1;
+    case kDistTriangular:
+        return 3;
+    case kDistWeibull:
+        return params.size() > 2 && params[2] != 0.0 ? 3 : 2;
+    default:
+        return 2;
+    }
+}
+
+void SetLikelihoodResults(DFCOutputStats::DFCVarDistElement& element, double logLik, double n) {
+    element.fNEstimatedParams = CountEstimatedParams(element.fDistType, element.fDistParams);
+    element.fLogLikelihood = kMissing;
+    element.fLogLikReason.clear();
+    if (MCMV::IsMissing(logLik)) {
+        element.fLogLikReason = "the density could not be evaluated";
+    } else if (logLik == -std::numeric_limits<double>::infinity()) {
+        element.fLogLikReason = "the density is 0 at a sample value";
+    } else if (!std::isfinite(logLik)) {
+        element.fLogLikReason = "the density is unbounded at a sample value";
+    } else {
+        element.fLogLikelihood = logLik;
+    }
+    const DFCInfoCriteria ic =
+        ComputeInfoCriteria(element.fLogLikelihood, element.fNEstimatedParams, n);
+    element.fAIC = ic.fAIC;
+    element.fBIC = ic.fBIC;
+    element.fAICc = ic.fAICc;
 }
 
 MCStatus DFCAlgorithm::ComputeChiSquare() {
@@ -315,14 +458,21 @@ MCStatus DFCAlgorithm::ComputeChiSquare() {
             for (int n = 0; n < fit.fNLowExpected; ++n) {
                 fWarnings.AddWarning(MCStatus(MCSPStatus::kLowExpectedOrException, true), 0);
             }
+            SetLikelihoodResults(
+                element, ComputeCountLogLikelihood(type, element.fDistParams, info.fCategoryCounts),
+                fValidWeight);
             if (fit.fbZeroProbability) {
-                DropCovarDist(i, type);
+                DropCovarDist(i, type, kDropZeroProbability);
                 continue;
             }
             element.fChiSquareFit = fit.fStatistic;
             element.fChiSquarePValue = fit.fPValue;
+            element.fChiSquarePooled = fit.fPooledStatistic;
+            element.fChiSquarePooledDF = fit.fPooledDegreesOfFreedom;
+            element.fChiSquarePooledPValue = fit.fPooledPValue;
             if (MCMV::IsMissing(fit.fPValue) || fit.fPValue < fPValueThreshold) {
-                DropCovarDist(i, type);
+                DropCovarDist(i, type,
+                              MCMV::IsMissing(fit.fPValue) ? kDropNoPValue : kDropBelowThreshold);
                 continue;
             }
             // Strictly smaller only: of equal statistics the lower type stays.
@@ -578,7 +728,8 @@ void DFCAlgorithm::ChooseEdfBestFit(int covariate) {
         const double stat = statOf(element);
         const double pValue = pValueOf(element);
         if (MCMV::IsMissing(pValue) || pValue < fPValueThreshold) {
-            DropCovarDist(covariate, type);
+            DropCovarDist(covariate, type,
+                          MCMV::IsMissing(pValue) ? kDropNoPValue : kDropBelowThreshold);
         } else if (best < 0 || MCMV::IsMissing(bestStat) || bestStat > stat) {
             // Strictly smaller only: of equal statistics the lower type stays.
             best = type;
@@ -658,6 +809,8 @@ DFCFittedCdf::DFCFittedCdf(DistType type, const std::vector<double>& params) : f
     fbValid = true;
     if (type == kDistGamma) {
         fLogNorm = boost::math::lgamma(fP0, MCMathPolicy()) - fP0 * std::log(fP1);
+    } else if (type == kDistNormal || type == kDistLognormal) {
+        fLogNorm = std::log(fP1) + kLnSqrtTwoPi;
     } else if (type == kDistBeta) {
         const double beta = boost::math::beta(fP0, fP1, MCMathPolicy());
         fLogNorm = beta > 0.0 && std::isfinite(beta)
@@ -672,6 +825,40 @@ double DFCFittedCdf::operator()(double x) const {
     }
     const double p[3] = {fP0, fP1, fP2};
     return fpFamily->fCdf(p, x);
+}
+
+double DFCFittedCdf::LogDensity(double x) const {
+    if (!fbValid || MCMV::IsMissing(x)) {
+        return kMissing;
+    }
+    constexpr double kInf = std::numeric_limits<double>::infinity();
+    // The family table's formulas (mcspdistfamily.cpp) with fLogNorm taken out of the loop;
+    // (a - 1)·ln x is 0 for a = 1, also at x = 0.
+    const auto xLogY = [](double a, double y) { return a == 0.0 ? 0.0 : a * std::log(y); };
+    switch (fType) {
+    case kDistGamma:
+        return x >= 0.0 ? xLogY(fP0 - 1.0, x) - fP1 * x - fLogNorm : -kInf;
+    case kDistBeta:
+        return x >= 0.0 && x <= 1.0
+                   ? xLogY(fP0 - 1.0, x) + (fP1 == 1.0 ? 0.0 : (fP1 - 1.0) * std::log1p(-x)) -
+                         fLogNorm
+                   : -kInf;
+    case kDistNormal: {
+        const double t = (x - fP0) / fP1;
+        return -0.5 * t * t - fLogNorm;
+    }
+    case kDistLognormal: {
+        if (!(x > 0.0)) {
+            return -kInf;
+        }
+        const double t = std::log(x / fP0) / fP1;
+        return -0.5 * t * t - std::log(x) - fLogNorm;
+    }
+    default: {
+        const double p[3] = {fP0, fP1, fP2};
+        return fpFamily->fLogDensity(p, x);
+    }
+    }
 }
 
 // ------------------------------------------------------------------------------------------
@@ -963,6 +1150,38 @@ double LookUpSignificance(double value, const std::vector<double>& criticals,
     return levels.back();
 }
 
+// A table gives the significance only at its levels: a statistic between two critical values
+// has a p-value between their levels, one beyond the table's ends a p-value beyond the first
+// or last level. LookUpSignificance's interpolated value keeps its role in the best-fit
+// choice; these bounds are what the table actually says.
+void LookUpSignificanceBounds(double value, const std::vector<double>& criticals,
+                              const std::vector<double>& levels, double& lower, double& upper) {
+    lower = kMissing;
+    upper = kMissing;
+    if (criticals.size() != levels.size() || criticals.empty() || MCMV::IsMissing(value)) {
+        return;
+    }
+    if (value <= criticals.front()) {
+        lower = levels.front();
+        return;
+    }
+    if (value >= criticals.back()) {
+        upper = levels.back();
+        return;
+    }
+    for (std::size_t j = 1; j < criticals.size(); ++j) {
+        if (value == criticals[j]) {
+            lower = upper = levels[j];
+            return;
+        }
+        if (value < criticals[j]) {
+            lower = std::min(levels[j - 1], levels[j]);
+            upper = std::max(levels[j - 1], levels[j]);
+            return;
+        }
+    }
+}
+
 // D'Agostino and Stephens (1986), table 4.9: the p-value of Z* for the Normal with mean and
 // variance estimated, four exponential-quadratic pieces in Z*.
 double AndersonDarlingNormalPValue(double z) {
@@ -1067,7 +1286,8 @@ double KolmogorovPValue(double x) {
 
 DFCEdfSignificance ComputeEdfSignificance(DistType type, double n, double a2, double d,
                                           double shape) {
-    DFCEdfSignificance out{kMissing, kMissing, kMissing, kMissing};
+    DFCEdfSignificance out;
+    out.fADZStar = out.fADPValue = out.fKSDStat = out.fKSPValue = kMissing;
     const bool hasAD = !MCMV::IsMissing(a2);
     const bool hasKS = !MCMV::IsMissing(d);
     const double rootN = std::sqrt(n);
@@ -1083,6 +1303,7 @@ DFCEdfSignificance ComputeEdfSignificance(DistType type, double n, double a2, do
         if (hasKS) {
             out.fKSDStat = d * (rootN - 0.01 + 0.85 / rootN);
             out.fKSPValue = LookUpSignificance(out.fKSDStat, kCrit, kLevels);
+            LookUpSignificanceBounds(out.fKSDStat, kCrit, kLevels, out.fKSPLower, out.fKSPUpper);
         }
         break;
     }
@@ -1113,10 +1334,14 @@ DFCEdfSignificance ComputeEdfSignificance(DistType type, double n, double a2, do
         if (hasAD) {
             out.fADZStar = (1.0 + 0.2 / rootN) * a2;
             out.fADPValue = LookUpSignificance(out.fADZStar, kADCrit, kADLevels);
+            LookUpSignificanceBounds(out.fADZStar, kADCrit, kADLevels, out.fADPLower,
+                                     out.fADPUpper);
         }
         if (hasKS) {
             out.fKSDStat = rootN * d;
             out.fKSPValue = LookUpSignificance(out.fKSDStat, kKSCrit, kKSLevels);
+            LookUpSignificanceBounds(out.fKSDStat, kKSCrit, kKSLevels, out.fKSPLower,
+                                     out.fKSPUpper);
         }
         break;
     }
@@ -1133,10 +1358,13 @@ DFCEdfSignificance ComputeEdfSignificance(DistType type, double n, double a2, do
             const std::vector<double>& crit =
                 shape <= 1.0 ? kADCritSmall : (shape <= 8.0 ? kADCritMid : kADCritLarge);
             out.fADPValue = LookUpSignificance(a2, crit, kADLevels);
+            LookUpSignificanceBounds(a2, crit, kADLevels, out.fADPLower, out.fADPUpper);
         }
         if (hasKS) {
             out.fKSDStat = (rootN + 0.3 / rootN) * d;
             out.fKSPValue = LookUpSignificance(out.fKSDStat, kKSCrit, kKSLevels);
+            LookUpSignificanceBounds(out.fKSDStat, kKSCrit, kKSLevels, out.fKSPLower,
+                                     out.fKSPUpper);
         }
         break;
     }
@@ -1150,6 +1378,7 @@ DFCEdfSignificance ComputeEdfSignificance(DistType type, double n, double a2, do
         if (hasKS) {
             out.fKSDStat = (d - 0.2 / n) * (rootN + 0.26 + 0.5 / rootN);
             out.fKSPValue = LookUpSignificance(out.fKSDStat, kCrit, kLevels);
+            LookUpSignificanceBounds(out.fKSDStat, kCrit, kLevels, out.fKSPLower, out.fKSPUpper);
         }
         break;
     }
@@ -1196,6 +1425,7 @@ void DFCFitGoodnessTask::RunTask() {
         fStatus = fpWeibull ? fpWeibull->GetStatus() : MCStatus();
         if (!solved || fStatus.IsError()) {
             fpElement->fbDistAllowed = false;
+            fpElement->fDropReason = kDropFailedSearch;
             fStatus = MCStatus(MCSPStatus::kDistDropped, true);
             fWarnings.AddWarning(fStatus, 0);
             return;
@@ -1204,15 +1434,81 @@ void DFCFitGoodnessTask::RunTask() {
     fStatus = ComputeEdfStatistics();
 }
 
+// Values at an end of the fitted support (the Uniform's and the Triangular's extremes, which
+// are the sample's; a 0 of an Exponential or a two-parameter Weibull) have F = 0 or 1 and an
+// infinite A² term. Skipping only their terms while counting their weight in W left A² biased
+// low, negative even (a Uniform on 8 values: -0.6; three values repeated hundreds of times
+// under a Triangular: -999.6). Instead A² and D are computed over the values strictly inside
+// the support, with W their weight. For the Uniform this is the textbook treatment: given the
+// sample extremes the n - 2 interior values are independent and uniform between them
+// (D'Agostino and Stephens 1986, section 4.4), so they are tested as a fully specified
+// Uniform. For the others it is a conditional test of the same kind. The sorted entries put
+// those values at the two ends, found by bisection; the log-likelihood, which needs every
+// value, is summed in the same pass as F.
+
+void DFCFitGoodnessTask::FindInterior(std::size_t& first, std::size_t& last, double& weight) const {
+    const std::vector<DFCGoodFitEntry>& entries = *fpEntries;
+    const std::vector<double>& params = fpElement->fDistParams;
+    first = 0;
+    last = fNEntries;
+    weight = fTotalWeight;
+    const MCSPDistFamily* family = MCSPFindDistFamily(fDistType);
+    if (family == nullptr || !family->IsValid(params)) {
+        return;
+    }
+    double lo = kMissing;
+    double hi = kMissing;
+    family->fSupport(params.data(), lo, hi);
+    const auto begin = entries.begin();
+    if (!MCMV::IsMissing(lo)) {
+        first = static_cast<std::size_t>(
+            std::partition_point(begin, entries.end(),
+                                 [lo](const DFCGoodFitEntry& e) { return e.fValue <= lo; }) -
+            begin);
+    }
+    if (!MCMV::IsMissing(hi)) {
+        last = static_cast<std::size_t>(
+            std::partition_point(begin + static_cast<std::ptrdiff_t>(first), entries.end(),
+                                 [hi](const DFCGoodFitEntry& e) { return e.fValue < hi; }) -
+            begin);
+    }
+    if (first == 0 && last == fNEntries) {
+        return;
+    }
+    double excluded = 0.0;
+    if (fpWeights) {
+        for (std::size_t k = 0; k < first; ++k) {
+            excluded += WeightOf(entries[k]);
+        }
+        for (std::size_t k = last; k < fNEntries; ++k) {
+            excluded += WeightOf(entries[k]);
+        }
+    }
+    weight = fpWeights ? fTotalWeight - excluded : static_cast<double>(last - first);
+}
+
+double DFCFitGoodnessTask::WeightOf(const DFCGoodFitEntry& entry) const {
+    const auto record = static_cast<std::size_t>(entry.fRecord);
+    return record < fpWeights->size() ? (*fpWeights)[record] : 0.0;
+}
+
 MCStatus DFCFitGoodnessTask::ComputeEdfStatistics() {
     const DFCFittedCdf cdf(fDistType, fpElement->fDistParams);
     const std::vector<DFCGoodFitEntry>& entries = *fpEntries;
+    std::size_t first = 0;
+    std::size_t last = 0;
+    double edfWeight = 0.0;
+    FindInterior(first, last, edfWeight);
     std::array<double, kEdfBlock> x{};
     std::array<double, kEdfBlock> u{};
     std::array<double, kEdfBlock> w{};
     DFCEdfState state;
     double lastX = kMissing;
     double lastU = kMissing;
+    double lastLnF = kMissing;
+    double llSum = 0.0;     // Σ w·ln f, Neumaier-compensated as A² is
+    double llComp = 0.0;    // its compensation
+    double llSpecial = 0.0; // the first ln f that is not finite, 0 while there is none
     for (std::size_t start = 0; start < fNEntries; start += kEdfBlock) {
         if (PollCancel()) {
             return MCStatus(MCSPStatus::kCancelled, false);
@@ -1221,34 +1517,54 @@ MCStatus DFCFitGoodnessTask::ComputeEdfStatistics() {
         for (std::size_t j = 0; j < m; ++j) {
             const DFCGoodFitEntry& entry = entries[start + j];
             x[j] = entry.fValue;
-            if (fpWeights) {
-                const auto record = static_cast<std::size_t>(entry.fRecord);
-                w[j] = record < fpWeights->size() ? (*fpWeights)[record] : 0.0;
-            }
+            w[j] = fpWeights ? WeightOf(entry) : 1.0;
         }
         cdf.EvaluateSorted(x.data(), m, u.data());
         for (std::size_t j = 0; j < m; ++j) {
-            // Tied values share F(x), across blocks too.
+            // Tied values share F(x) and ln f(x), across blocks too.
             if (x[j] == lastX) {
                 u[j] = lastU;
-            } else if (MCMV::IsMissing(u[j])) {
-                fpElement->fbDistAllowed = false;
-                return MCStatus(MCSPStatus::kDistDropped, true);
+            } else {
+                if (MCMV::IsMissing(u[j]) && start + j >= first && start + j < last) {
+                    fpElement->fbDistAllowed = false;
+                    fpElement->fDropReason = kDropNoDistributionFunction;
+                    return MCStatus(MCSPStatus::kDistDropped, true);
+                }
+                lastLnF = cdf.LogDensity(x[j]);
             }
             lastX = x[j];
             lastU = u[j];
+            if (!std::isfinite(lastLnF)) {
+                llSpecial = llSpecial == 0.0 ? lastLnF : llSpecial;
+                continue;
+            }
+            const double term = w[j] * lastLnF;
+            const double t = llSum + term;
+            llComp += std::fabs(llSum) >= std::fabs(term) ? (llSum - t) + term : (term - t) + llSum;
+            llSum = t;
         }
-        AccumulateEdfTerms(u.data(), fpWeights ? w.data() : nullptr, m, fTotalWeight, fbComputeAD,
-                           fbComputeKS, state);
+        const std::size_t b = std::max(start, first);
+        const std::size_t e = std::min(start + m, last);
+        if (b < e) {
+            AccumulateEdfTerms(u.data() + (b - start), fpWeights ? w.data() + (b - start) : nullptr,
+                               e - b, edfWeight, fbComputeAD, fbComputeKS, state);
+        }
+    }
+    SetLikelihoodResults(*fpElement, llSpecial == 0.0 ? llSum + llComp : llSpecial, fTotalWeight);
+    fpElement->fEdfWeight = edfWeight;
+    if (!(edfWeight >= kMinEdfWeight)) {
+        fpElement->fbDistAllowed = false;
+        fpElement->fDropReason = kDropTooFewValues;
+        return MCStatus(MCSPStatus::kDistDropped, true);
     }
     if (fbComputeAD) {
-        fADFit = FinishAndersonDarling(state, fTotalWeight);
+        fADFit = FinishAndersonDarling(state, edfWeight);
     }
     if (fbComputeKS) {
         fKSFit = Finite(state.fKSMax);
     }
     const std::vector<double>& params = fpElement->fDistParams;
-    const DFCEdfSignificance sig = ComputeEdfSignificance(fDistType, fTotalWeight, fADFit, fKSFit,
+    const DFCEdfSignificance sig = ComputeEdfSignificance(fDistType, edfWeight, fADFit, fKSFit,
                                                           params.empty() ? kMissing : params[0]);
     fADZStar = sig.fADZStar;
     fADPValue = sig.fADPValue;
@@ -1260,6 +1576,10 @@ MCStatus DFCFitGoodnessTask::ComputeEdfStatistics() {
     fpElement->fKSFit = fKSFit;
     fpElement->fKSDStat = fKSDStat;
     fpElement->fKSPValue = fKSPValue;
+    fpElement->fADPValueLower = sig.fADPLower;
+    fpElement->fADPValueUpper = sig.fADPUpper;
+    fpElement->fKSPValueLower = sig.fKSPLower;
+    fpElement->fKSPValueUpper = sig.fKSPUpper;
     return MCStatus();
 }
 

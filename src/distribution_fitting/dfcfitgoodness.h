@@ -13,6 +13,7 @@
 #include "component/mcspcomponent.h"
 #include "distribution_fitting/dfcoutputstats.h"
 #include "distribution_fitting/dfcsettings.h"
+#include "mccommon/mcmv.h"
 #include "mcmath/mccancelinfo.h"
 #include "mcthread/mcthread.h"
 #include "simulation_common/mcspconst.h"
@@ -38,6 +39,12 @@ struct DFCChiSquareResult {
     int fNLowExpected;        //!< bins whose expected count E_c is below 5
     bool fbZeroProbability;   //!< a bin had probability 0: the candidate cannot describe the
                               //!< data, and the statistic is missing
+    //! The same statistic over groups of adjacent bins, each with an expected count of at least
+    //! 5 (see the .cpp); missing with the unpooled one.
+    double fPooledStatistic = MCCommon_800::MCMV::Missing();
+    double fPooledDegreesOfFreedom = MCCommon_800::MCMV::Missing(); //!< groups - 1 - q
+    double fPooledPValue = MCCommon_800::MCMV::Missing();           //!< missing when that df ≤ 0
+    int fNPooledBins = 0;                                           //!< number of groups
 };
 
 //! Chi-square test of candidate `type` (Binomial, NegBin or Poisson) with `params` against
@@ -46,6 +53,29 @@ struct DFCChiSquareResult {
 DFCChiSquareResult ComputeChiSquareFit(MCSPConst::DistType type, const std::vector<double>& params,
                                        const std::vector<double>& counts, double totalWeight,
                                        double maximum);
+
+//! Σ_c counts[c]·ln P(X = c) of count candidate `type` with `params`, over the values with a
+//! positive count: the log-likelihood of a count field from its category counts. −∞ when an
+//! observed value has probability 0; missing when the parameters admit no probabilities.
+double ComputeCountLogLikelihood(MCSPConst::DistType type, const std::vector<double>& params,
+                                 const std::vector<double>& counts);
+
+//! The information criteria of a fit with log-likelihood `logLik`, `k` estimated parameters and
+//! total weight `n`. Missing where ln L is missing; AICc also where n ≤ k + 1.
+struct DFCInfoCriteria {
+    double fAIC;  //!< 2k - 2·ln L (Akaike 1974)
+    double fBIC;  //!< k·ln n - 2·ln L (Schwarz 1978)
+    double fAICc; //!< AIC + 2k(k + 1)/(n - k - 1) (Hurvich and Tsai 1989)
+};
+DFCInfoCriteria ComputeInfoCriteria(double logLik, int k, double n);
+
+//! The number of parameters of candidate `type` with `params` that the fitting estimates from
+//! the data (the Weibull's location only when it is not 0, the NegBin's kind never).
+int CountEstimatedParams(MCSPConst::DistType type, const std::vector<double>& params);
+
+//! Writes ln L (or its reason when it is not finite: `logLik` −∞, +∞ or missing), k, AIC, BIC
+//! and AICc into `element`, with total weight `n`.
+void SetLikelihoodResults(DFCOutputStats::DFCVarDistElement& element, double logLik, double n);
 
 // ------------------------------------------------------------------------------------------
 // EDF statistics
@@ -66,6 +96,10 @@ public:
     //! between exact values every 32 entries, F is carried from entry to entry by integrating
     //! the density (see the .cpp).
     void EvaluateSorted(const double* x, std::size_t n, double* u) const;
+    //! ln f(x), the family table's log-density with the normalising constant prepared once
+    //! for the Gamma, Beta, Normal and LogNormal; −∞ outside the support, missing when the
+    //! parameters admit no density.
+    double LogDensity(double x) const;
 
 private:
     //! The exact F(x) (`upper` false) or 1 - F(x) (`upper` true) of a carried candidate.
@@ -84,7 +118,8 @@ private:
     double fP1 = 0.0;                         //!< second parameter
     double fP2 = 0.0;                         //!< third parameter
     bool fbValid = false;                     //!< the parameters are usable
-    double fLogNorm = 0.0; //!< ln Γ(α) - α·ln β (Gamma) or ln B(a, b) (Beta)
+    double fLogNorm = 0.0; //!< ln Γ(α) - α·ln β (Gamma), ln B(a, b) (Beta), ln(σ·√(2π))
+                           //!< (Normal, LogNormal)
 };
 
 //! Running sums of the EDF statistics over sorted probabilities u_1 ≤ u_2 ≤ ..., so that they
@@ -116,6 +151,12 @@ struct DFCEdfSignificance {
     double fADPValue; //!< p-value of A²
     double fKSDStat;  //!< modified D (D*)
     double fKSPValue; //!< p-value of D
+    //! Ends of the table interval in which a p-value read from critical values lies (missing
+    //! when unbounded on that side, both missing for a p-value from a formula).
+    double fADPLower = MCCommon_800::MCMV::Missing();
+    double fADPUpper = MCCommon_800::MCMV::Missing();
+    double fKSPLower = MCCommon_800::MCMV::Missing();
+    double fKSPUpper = MCCommon_800::MCMV::Missing();
 };
 
 //! Z*, D* and the p-values of candidate `type` from A² `a2` and D `d` (either missing when not
@@ -128,6 +169,12 @@ DFCEdfSignificance ComputeEdfSignificance(MCSPConst::DistType type, double n, do
 //! length or are empty, or `value` is missing.
 double LookUpSignificance(double value, const std::vector<double>& criticals,
                           const std::vector<double>& levels);
+//! The levels between which `value` lies in the same tables: at or below the first critical
+//! value p ≥ the first level (`upper` missing), at or above the last p ≤ the last level
+//! (`lower` missing), between two critical values the two levels, at one its level twice. Both
+//! missing where LookUpSignificance is.
+void LookUpSignificanceBounds(double value, const std::vector<double>& criticals,
+                              const std::vector<double>& levels, double& lower, double& upper);
 //! p-value of Z* = A²·(1 + 0.75/n + 2.25/n²) for the Normal with estimated mean and variance.
 double AndersonDarlingNormalPValue(double zStar);
 //! p-value of Z* = A²·(1 + 0.6/n) for the Exponential with estimated scale.
@@ -162,8 +209,9 @@ public:
     DFCFitGoodnessTask(const DFCFitGoodnessTask&) = delete;
     DFCFitGoodnessTask& operator=(const DFCFitGoodnessTask&) = delete;
 
-    //! Weibull estimate, EDF statistics and p-values into the element. A failed Weibull
-    //! estimate or a missing F(x) drops the element with status 390004 (warning).
+    //! Weibull estimate, EDF statistics, p-values and log-likelihood into the element. A
+    //! failed Weibull estimate, a missing F(x) or fewer than two values strictly inside the
+    //! fitted support drop the element with status 390004 (warning).
     void RunTask() override;
 
     int GetCovariate() const { return fCovariate; }
@@ -176,8 +224,12 @@ public:
     bool IsCancelled() const { return fbCancelled; }
 
 private:
-    //! u, A², D, Z*, D* and the p-values; the status of the computation.
+    //! u, A², D, Z*, D*, the p-values and ln L; the status of the computation.
     MCStatus ComputeEdfStatistics();
+    //! The sorted entries [first, last) strictly inside the fitted support and their weight.
+    void FindInterior(std::size_t& first, std::size_t& last, double& weight) const;
+    //! The frequency weight of `entry` (weighted runs only).
+    double WeightOf(const DFCGoodFitEntry& entry) const;
     //! True when the task's or the run's cancel record reports a pending cancel.
     bool PollCancel();
 

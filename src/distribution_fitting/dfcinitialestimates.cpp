@@ -83,6 +83,7 @@ MCStatus DFCAlgorithm::SetInitialDistParams() {
             // A constant field has no distribution to fit.
             if (moments.fMinimum == moments.fMaximum) {
                 element.fbDistAllowed = false;
+                element.fDropReason = kDropNoVariance;
                 fvAllowedMask[ui] &= static_cast<std::uint16_t>(~(1u << k));
                 continue;
             }
@@ -94,7 +95,7 @@ MCStatus DFCAlgorithm::SetInitialDistParams() {
                 continue;
             }
             if (!ComputeMomentEstimate(type, moments, fbThreeParamWeibull, element.fDistParams)) {
-                DropCovarDist(i, type);
+                DropCovarDist(i, type, moments.fVariance > 0.0 ? kDropNoEstimate : kDropNoVariance);
                 continue;
             }
             element.fInitParams = element.fDistParams;

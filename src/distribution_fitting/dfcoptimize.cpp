@@ -78,7 +78,7 @@ MCStatus DFCAlgorithm::OptimizeDistParams(MultiPassRecordIter& /*trainData*/) {
                 // covariate has: a continuous covariate holding whole numbers loses it.
                 const MCMath_800::MCCatStats* catStats = fvpCatStatsCovars[ui].get();
                 if (!catStats) {
-                    DropCovarDist(i, type);
+                    DropCovarDist(i, type, kDropNoCategoryCounts);
                     continue;
                 }
                 auto accum = std::make_unique<DFCAccumStatsNegBin>(
@@ -128,7 +128,10 @@ MCStatus DFCAlgorithm::OptimizeDistParams(MultiPassRecordIter& /*trainData*/) {
                 const int i = task.GetCovariate();
                 fvAllowedMask[static_cast<std::size_t>(i)] &=
                     static_cast<std::uint16_t>(~(1u << task.GetDistType()));
-                GetOutCovarDistInfo(i, task.GetDistType()).fbDistAllowed = false;
+                DFCOutputStats::DFCVarDistElement& element =
+                    GetOutCovarDistInfo(i, task.GetDistType());
+                element.fbDistAllowed = false;
+                element.fDropReason = kDropFailedSearch;
             }
         }
         if (job.fpWarnings) {

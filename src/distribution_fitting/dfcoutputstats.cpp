@@ -19,6 +19,41 @@ std::string VarName(const MCXML_800::MCVarList& variables, int varIndex) {
 
 } // namespace
 
+const char* DFCDropReasonText(DFCDropReason reason) {
+    switch (reason) {
+    case kDropNone:
+        return "";
+    case kDropSupport:
+        return "a value lies outside the family's support";
+    case kDropNoVariance:
+        return "the field does not vary";
+    case kDropNoEstimate:
+        return "the estimate is not a finite number";
+    case kDropFailedSearch:
+        return "the maximum-likelihood search failed";
+    case kDropUnderDispersion:
+        return "variance not above the mean: no maximum-likelihood estimate (its limit is the "
+               "Poisson)";
+    case kDropOverDispersion:
+        return "variance not below the mean";
+    case kDropRangeOverflow:
+        return "the range of the values overflows";
+    case kDropNoCategoryCounts:
+        return "no category counts (continuous field)";
+    case kDropZeroProbability:
+        return "an observed value has probability 0";
+    case kDropNoDistributionFunction:
+        return "the distribution function could not be evaluated";
+    case kDropTooFewValues:
+        return "too few values strictly inside the fitted support";
+    case kDropNoPValue:
+        return "no p-value (no degrees of freedom left)";
+    case kDropBelowThreshold:
+        return "p-value below the threshold";
+    }
+    return "";
+}
+
 // ------------------------------------------------------------------------------------------
 // The implementation object: the referenced settings and variables and the results proper.
 
@@ -79,7 +114,13 @@ DFCOutputStats::DFCVarDistElement::DFCVarDistElement(MCSPConst::DistType type, b
     : fDistType(type), fDistName(DistType2String(type)), fbDistAllowed(allowed),
       fChiSquareFit(MCMV::Missing()), fChiSquarePValue(MCMV::Missing()), fADFit(MCMV::Missing()),
       fADZStar(MCMV::Missing()), fADPValue(MCMV::Missing()), fKSFit(MCMV::Missing()),
-      fKSDStat(MCMV::Missing()), fKSPValue(MCMV::Missing()) {
+      fKSDStat(MCMV::Missing()), fKSPValue(MCMV::Missing()), fADPValueLower(MCMV::Missing()),
+      fADPValueUpper(MCMV::Missing()), fKSPValueLower(MCMV::Missing()),
+      fKSPValueUpper(MCMV::Missing()), fEdfWeight(MCMV::Missing()),
+      fChiSquarePooled(MCMV::Missing()), fChiSquarePooledDF(MCMV::Missing()),
+      fChiSquarePooledPValue(MCMV::Missing()), fLogLikelihood(MCMV::Missing()),
+      fNEstimatedParams(0), fAIC(MCMV::Missing()), fBIC(MCMV::Missing()), fAICc(MCMV::Missing()),
+      fDropReason(kDropNone) {
     GetDistributionParameterNames(type, fDistParamNames);
 }
 
@@ -100,6 +141,10 @@ void DFCOutputStats::DFCVarDistElement::Display() const {
     DisplayD("Kolmogorov-Smirnov Fit", fKSFit);
     DisplayD("Kolmogorov-Smirnov D Statistic", fKSDStat);
     DisplayD("Kolmogorov-Smirnov P Value", fKSPValue);
+    DisplayD("Log-likelihood", fLogLikelihood);
+    DisplayD("AIC", fAIC);
+    DisplayD("BIC", fBIC);
+    DisplayS("Drop reason:", DFCDropReasonText(fDropReason));
 }
 
 // ------------------------------------------------------------------------------------------

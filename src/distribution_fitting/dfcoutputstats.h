@@ -21,6 +21,28 @@
 
 namespace MCMCSP_800 {
 
+//! Why a candidate distribution is no longer a candidate. kDropNone while it is one, and for a
+//! family the settings never allowed.
+enum DFCDropReason {
+    kDropNone = 0,               //!< still a candidate
+    kDropSupport,                //!< a value lies outside the family's support
+    kDropNoVariance,             //!< the field is constant or has too little weight to vary
+    kDropNoEstimate,             //!< the estimate is not a finite number
+    kDropFailedSearch,           //!< the maximum-likelihood search failed
+    kDropUnderDispersion,        //!< NegBin: variance not above the mean, no ML estimate
+    kDropOverDispersion,         //!< Binomial: variance not below the mean
+    kDropRangeOverflow,          //!< maximum - minimum overflows
+    kDropNoCategoryCounts,       //!< NegBin of a continuous field: no counts to fit
+    kDropZeroProbability,        //!< an observed value has probability 0 under the fit
+    kDropNoDistributionFunction, //!< F(x) could not be evaluated at a value
+    kDropTooFewValues,           //!< fewer than two values strictly inside the fitted support
+    kDropNoPValue,               //!< no p-value (no degrees of freedom left)
+    kDropBelowThreshold          //!< p-value below the settings' threshold
+};
+
+//! A short English text of `reason` ("" for kDropNone).
+const char* DFCDropReasonText(DFCDropReason reason);
+
 class DFCOutputStats {
 public:
     //! One candidate distribution of one field: its parameters and test statistics. Every
@@ -46,6 +68,25 @@ public:
         double fKSFit;                            //!< Kolmogorov-Smirnov D
         double fKSDStat;                          //!< modified D
         double fKSPValue;                         //!< its p-value
+        // Added results. A p-value read from a table of critical values is only known to lie
+        // between two of its levels (or beyond the first or last): its ends are given below,
+        // either missing when unbounded; both missing when the p-value comes from a formula.
+        double fADPValueLower;         //!< lower end of the A² p-value's table interval
+        double fADPValueUpper;         //!< upper end of the A² p-value's table interval
+        double fKSPValueLower;         //!< lower end of the D p-value's table interval
+        double fKSPValueUpper;         //!< upper end of the D p-value's table interval
+        double fEdfWeight;             //!< weight of the values strictly inside the fitted
+                                       //!< support, over which A² and D were computed
+        double fChiSquarePooled;       //!< chi-square over bins pooled to expected counts ≥ 5
+        double fChiSquarePooledDF;     //!< its degrees of freedom
+        double fChiSquarePooledPValue; //!< its p-value
+        double fLogLikelihood;         //!< Σ w·ln f(x) at the estimate
+        int fNEstimatedParams;         //!< k, parameters estimated from the data
+        double fAIC;                   //!< 2k - 2·ln L
+        double fBIC;                   //!< k·ln W - 2·ln L
+        double fAICc;                  //!< AIC + 2k(k + 1)/(W - k - 1); missing when W ≤ k + 1
+        std::string fLogLikReason;     //!< why ln L (and AIC, BIC, AICc) is missing, or ""
+        DFCDropReason fDropReason;     //!< why the candidate was dropped, kDropNone if it was not
 
         //! Diagnostic listing through the display stream.
         void Display() const;

@@ -332,8 +332,9 @@ INSTANTIATE_TEST_SUITE_P(Table, SupportChecks, ::testing::Values(
                 {0, 1, 4, 5}, {0, 1, 4, 5}, {4}},
     SupportCase{"ZeroLosesLogNormalAndGamma", {0.0, 1.0, 2.0, 3.5}, {}, kLevelContinuous,
                 {3, 9, 11}, {3, 9}, {11}},
+    // Triangular and Uniform keep one value inside their support: too few for the EDF tests.
     SupportCase{"NegativeLosesPositiveTypes", {-1.0, 0.5, 2.0}, {}, kLevelContinuous,
-                {3, 4, 6, 7, 8, 9, 10, 11}, {3, 8, 9, 10, 11}, {4, 6, 7}},
+                {3, 4, 6, 7, 8, 9, 10, 11}, {3, 6, 7, 8, 9, 10, 11}, {4, 6, 7}},
     SupportCase{"ProportionsKeepBeta", {0.2, 0.5, 0.9}, {}, kLevelContinuous, {4, 10}, {}, {4, 10}},
     SupportCase{"OneLosesBeta", {0.2, 1.0, 0.4}, {}, kLevelContinuous, {10}, {10}, {}},
     SupportCase{"RepeatedFailuresWarnOnce", {2.5, 3.5, 4.5, 5.5}, {}, kLevelOrdinal, {5}, {5}, {}},
@@ -342,9 +343,10 @@ INSTANTIATE_TEST_SUITE_P(Table, SupportChecks, ::testing::Values(
     // Triangular drops with a warning in the pass, the others silently as constant.
     SupportCase{"ConstantLosesEverything", {3.0, 3.0, 3.0}, {}, kLevelContinuous,
                 {4, 6, 7}, {6}, {}},
-    // W = 0.7: no variance with divisor W - 1, so no Gamma estimate.
+    // W = 0.7: no variance with divisor W - 1, so no Gamma estimate; too little weight for
+    // the EDF tests of the others.
     SupportCase{"UnderOneWeightUnitNoVariance", {1.0, 2.0}, {0.3, 0.4}, kLevelContinuous,
-                {4, 7, 9}, {9}, {4, 7}}),
+                {4, 7, 9}, {4, 7, 9}, {4, 7}}),
     ByName());
 // clang-format on
 

@@ -123,6 +123,11 @@ def main():
         if BINOMIAL in allowed and v1 >= m:
             allowed.discard(BINOMIAL)
             n_warnings += 1
+        # No negative binomial maximum-likelihood estimate unless the variance (divisor W)
+        # exceeds the mean.
+        if NEGBIN in allowed and hi > lo and not vW > m:
+            allowed.discard(NEGBIN)
+            n_warnings += 1
         t = 3 * (m - lo) / (hi - lo) - 1
         mode = lo if t <= 0 else (hi if t >= 1 else lo + (hi - lo) * t)
         positive = all(x > 0 for x, _ in xs)
