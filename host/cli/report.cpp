@@ -37,6 +37,19 @@ std::vector<ReportInputMeasures> InputMeasures(const std::vector<std::string>& c
     return measures;
 }
 
+//! The skipped counts of a target's measures, where the measure ran.
+void AddSkipped(const MCMCSP_800::SECContinuousTargetInfo& info,
+                std::vector<ReportInputMeasures>& measures) {
+    for (std::size_t k = 0; k < measures.size(); ++k) {
+        if (k < info.fvDeltaSkipped.size()) {
+            measures[k].fDeltaSkipped = info.fvDeltaSkipped[k];
+        }
+        if (k < info.fvVarianceSkipped.size()) {
+            measures[k].fVarianceSkipped = info.fvVarianceSkipped[k];
+        }
+    }
+}
+
 //! The label of a categorical target's category `value`, from the target's variable: a text
 //! category's value is its code, a numeric category's value its number.
 std::string CategoryLabel(const MCXML_800::MCVarList& vars, const std::string& target,
@@ -113,6 +126,7 @@ ReportContinuousTarget BuildContinuous(const MCMCSP_800::SECContinuousTargetInfo
     target.fvInputs =
         InputMeasures(stats.GetCovariateNames(), info.fvPearsonCorrs, info.fvNegativeDelta,
                       info.fvPositiveDelta, info.fvVarianceContrib);
+    AddSkipped(info, target.fvInputs);
     return target;
 }
 
@@ -138,7 +152,8 @@ std::vector<ReportCorrelation> BuildCorrelations(const SECOutputStats& stats) {
             if (static_cast<int>(j) < simulated.GetNRows()) {
                 pair.fSimulated = simulated.GetElem(static_cast<int>(i), static_cast<int>(j));
             }
-            for (const MCMCSP_800::SECInputCorrelationPair& model : stats.GetInputCorrelationPairs()) {
+            for (const MCMCSP_800::SECInputCorrelationPair& model :
+                 stats.GetInputCorrelationPairs()) {
                 if ((model.fFirst == names[i] && model.fSecond == names[j]) ||
                     (model.fFirst == names[j] && model.fSecond == names[i])) {
                     pair.fNormal = model.fNormalCorr;

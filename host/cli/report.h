@@ -60,6 +60,11 @@ struct ReportInputMeasures {
     double fDeltaNegative; //!< mean change of the target, input − δ (tornado)
     double fDeltaPositive; //!< mean change of the target, input + δ (tornado)
     double fVarianceShare; //!< contribution of the input to the target's variance
+    //! Accepted cases left out of the tornado (either side) and of the variance share: a
+    //! shifted input outside its range, a variant the model could not score; −1 when the
+    //! measure is off.
+    std::int64_t fDeltaSkipped = -1;
+    std::int64_t fVarianceSkipped = -1; //!< the same for the variance share
 };
 
 struct ReportPercentile {
@@ -102,10 +107,10 @@ struct ReportCorrelation {
     std::string fSecond; //!< input
     double fPlan;        //!< the plan's (missing when it sets none)
     double fSimulated;   //!< the simulated cases' (missing when not computed)
-    double fNormal = MCCommon_800::MCMV::Missing();  //!< the normal-scale value used
-    double fLow = MCCommon_800::MCMV::Missing();     //!< lowest attainable correlation
-    double fHigh = MCCommon_800::MCMV::Missing();    //!< highest attainable correlation
-    bool fbUnreachable = false;                      //!< the plan's lies outside [fLow, fHigh]
+    double fNormal = MCCommon_800::MCMV::Missing(); //!< the normal-scale value used
+    double fLow = MCCommon_800::MCMV::Missing();    //!< lowest attainable correlation
+    double fHigh = MCCommon_800::MCMV::Missing();   //!< highest attainable correlation
+    bool fbUnreachable = false;                     //!< the plan's lies outside [fLow, fHigh]
     //! |simulated − plan| over its standard error (1 − ρ²)/√(n − 1); missing when unknown.
     double fDeviation = MCCommon_800::MCMV::Missing();
 };

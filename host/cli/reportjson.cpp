@@ -29,6 +29,10 @@ Json InputMeasures(const std::vector<ReportInputMeasures>& inputs, bool continuo
             entry["delta_negative"] = Number(m.fDeltaNegative);
             entry["delta_positive"] = Number(m.fDeltaPositive);
             entry["variance_contribution"] = Number(m.fVarianceShare);
+            // Cases the measure left out (null when it did not run).
+            entry["delta_skipped"] = m.fDeltaSkipped >= 0 ? Json(m.fDeltaSkipped) : Json(nullptr);
+            entry["variance_skipped"] =
+                m.fVarianceSkipped >= 0 ? Json(m.fVarianceSkipped) : Json(nullptr);
         }
         list.push_back(std::move(entry));
     }

@@ -127,6 +127,23 @@ void WriteInputMeasures(std::ostream& out, const std::vector<ReportInputMeasures
     }
     out << "  sensitivity to the simulated inputs\n";
     WriteTable(out, "    ", rows);
+    // Cases a measure left out, so that a reader knows on how many cases each figure rests.
+    for (const ReportInputMeasures& m : inputs) {
+        const std::int64_t ds = delta ? m.fDeltaSkipped : 0;
+        const std::int64_t vs = variance ? m.fVarianceSkipped : 0;
+        if (ds > 0 || vs > 0) {
+            out << "    " << m.fInput << ":";
+            if (ds > 0) {
+                out << " " << ds << " cases left out of the changes";
+            }
+            if (vs > 0) {
+                out << (ds > 0 ? "," : "") << " " << vs << " cases left out of the variance share";
+            }
+            out << " (a shifted value outside the input's range, or a variant the model could not"
+                << " score)";
+            out << "\n";
+        }
+    }
 }
 
 void WriteContinuous(std::ostream& out, const ReportContinuousTarget& t,
@@ -195,13 +212,12 @@ void WriteCorrelations(std::ostream& out, const ReportIteration& it) {
         if (rows.size() > kMaxPairs) {
             continue;
         }
-        const std::string range = MCMV::IsMissing(c.fLow)
-                                      ? "-"
-                                      : "[" + Fixed(c.fLow, 3) + ", " + Fixed(c.fHigh, 3) + "]";
-        rows.push_back({c.fFirst + " ~ " + c.fSecond, Fixed(c.fPlan, 3), range,
-                        MCMV::IsMissing(c.fNormal) ? "-" : Fixed(c.fNormal, 4),
-                        Fixed(c.fSimulated, 3),
-                        c.fbUnreachable ? "unreachable" : "off by " + Fixed(c.fDeviation, 1) + " se"});
+        const std::string range =
+            MCMV::IsMissing(c.fLow) ? "-" : "[" + Fixed(c.fLow, 3) + ", " + Fixed(c.fHigh, 3) + "]";
+        rows.push_back(
+            {c.fFirst + " ~ " + c.fSecond, Fixed(c.fPlan, 3), range,
+             MCMV::IsMissing(c.fNormal) ? "-" : Fixed(c.fNormal, 4), Fixed(c.fSimulated, 3),
+             c.fbUnreachable ? "unreachable" : "off by " + Fixed(c.fDeviation, 1) + " se"});
     }
     out << "\ncorrelations of the simulated inputs\n";
     if (rows.size() > 1) {
@@ -209,7 +225,8 @@ void WriteCorrelations(std::ostream& out, const ReportIteration& it) {
     }
     const std::size_t flagged = it.fvCorrelations.size() - others;
     if (flagged + 1 > rows.size()) {
-        out << "  ... " << flagged + 1 - rows.size() << " more such pairs (all in the JSON results)\n";
+        out << "  ... " << flagged + 1 - rows.size()
+            << " more such pairs (all in the JSON results)\n";
     }
     out << "  " << others << (others == 1 ? " pair" : " pairs")
         << " within 3 standard errors of the plan or with none planned (all in the JSON results)\n";

@@ -23,6 +23,7 @@
 #include "simulation_common/mcsphistogramdata.h"
 #include "simulation_common/mcspscatterplotdata.h"
 
+#include <cstdint>
 #include <memory>
 #include <ostream>
 #include <string>
@@ -60,6 +61,12 @@ struct SECContinuousTargetInfo {
     std::vector<MCMath_800::MCContStats> fvNegativeDeltaStats; //!< changes behind it
     std::vector<double> fvVarianceContrib;                     //!< share of the variance
     std::vector<MCMath_800::MCContStats> fvVarianceContribStats; //!< products behind it
+    //! Per covariate: accepted cases whose shifted re-scoring (delta measure, either side) or
+    //! whose replaced-input re-scoring (variance measure) could not be evaluated and was left
+    //! out of the measure: a shifted input outside its natural range, a failed or missing
+    //! score, no further case. The evaluations used are the counts of the statistics above.
+    std::vector<std::int64_t> fvDeltaSkipped;
+    std::vector<std::int64_t> fvVarianceSkipped; //!< the same for the variance measure
 
     //! Diagnostic print through the display stream.
     void Display() const;
@@ -87,13 +94,13 @@ struct SECCategoricalTargetInfo {
 //! One pair of correlated inputs (a non-zero target in the plan): what the plan asks, what the
 //! correlation model could give, and what the cases show. Numbers not known are missing.
 struct SECInputCorrelationPair {
-    std::string fFirst;                                   //!< input
-    std::string fSecond;                                  //!< input
-    double fTarget = MCCommon_800::MCMV::Missing();       //!< the plan's correlation ρ
-    double fNormalCorr = MCCommon_800::MCMV::Missing();   //!< the normal-scale value used
+    std::string fFirst;                                     //!< input
+    std::string fSecond;                                    //!< input
+    double fTarget = MCCommon_800::MCMV::Missing();         //!< the plan's correlation ρ
+    double fNormalCorr = MCCommon_800::MCMV::Missing();     //!< the normal-scale value used
     double fAttainableLow = MCCommon_800::MCMV::Missing();  //!< g(−1), the lowest attainable
     double fAttainableHigh = MCCommon_800::MCMV::Missing(); //!< g(+1), the highest attainable
-    double fSimulated = MCCommon_800::MCMV::Missing();    //!< correlation of the valid cases
+    double fSimulated = MCCommon_800::MCMV::Missing();      //!< correlation of the valid cases
     bool fbUnreachable = false; //!< ρ lies outside [fAttainableLow, fAttainableHigh]
 };
 

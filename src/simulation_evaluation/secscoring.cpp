@@ -194,9 +194,9 @@ MCStatus SECSimulator::ProcessTargetInfo() {
             }
         } else {
             // One target, the prediction (or the cluster identifier).
-            const MCXML_800::IMCVariable* variable =
-                fpScoreComputer->GetNTargets() > 0 ? fpScoreComputer->GetTargetVariable(0)
-                                                   : nullptr;
+            const MCXML_800::IMCVariable* variable = fpScoreComputer->GetNTargets() > 0
+                                                         ? fpScoreComputer->GetTargetVariable(0)
+                                                         : nullptr;
             Target target;
             target.fValuePos = 0;
             target.fpVariable = variable;
@@ -244,11 +244,10 @@ MCStatus SECSimulator::PrepareTargetInfo() {
         target.fpVariable = fpVarList->GetVariable(planTarget.fName);
         MCSP_ASSERT(target.fpVariable != nullptr,
                     "SECSimulator::PrepareTargetInfo: each target is a variable of the host");
-        target.fbCategorical =
-            target.fpVariable != nullptr
-                ? IsCategoricalMeasure(target.fpVariable)
-                : planTarget.fMeasurementLevel != MCSPConst::kLevelContinuous &&
-                      planTarget.fMeasurementLevel != MCSPConst::kLevelUnknown;
+        target.fbCategorical = target.fpVariable != nullptr
+                                   ? IsCategoricalMeasure(target.fpVariable)
+                                   : planTarget.fMeasurementLevel != MCSPConst::kLevelContinuous &&
+                                         planTarget.fMeasurementLevel != MCSPConst::kLevelUnknown;
         target.fValuePos = fNValuesPerCase++;
         const MCXML_800::MCCatNumEncoder* encoder =
             target.fpVariable != nullptr ? target.fpVariable->GetCategorical() : nullptr;
@@ -303,8 +302,7 @@ MCStatus SECSimulator::FinishTargetSetup() {
     for (Target& target : fvTargets) {
         ApplyTargetFilter(target);
         target.fChartMin = IsFiniteBound(target.fFilterLow) ? target.fFilterLow : MCMV::Missing();
-        target.fChartMax =
-            IsFiniteBound(target.fFilterHigh) ? target.fFilterHigh : MCMV::Missing();
+        target.fChartMax = IsFiniteBound(target.fFilterHigh) ? target.fFilterHigh : MCMV::Missing();
         if (target.fbCategorical) {
             if (!target.fvLabels.empty()) {
                 target.fChartMin = -0.5;
@@ -316,9 +314,9 @@ MCStatus SECSimulator::FinishTargetSetup() {
             const MCXML_800::MCCatNumEncoder* encoder =
                 target.fpVariable != nullptr ? target.fpVariable->GetCategorical() : nullptr;
             for (std::size_t c = 0; c < target.fvLabels.size(); ++c) {
-                const double number =
-                    encoder != nullptr ? encoder->GetCategoryNumber(static_cast<int>(c))
-                                       : MCMV::Missing();
+                const double number = encoder != nullptr
+                                          ? encoder->GetCategoryNumber(static_cast<int>(c))
+                                          : MCMV::Missing();
                 info.fvCategoryValues.push_back(MCMV::IsMissing(number) ? static_cast<double>(c)
                                                                         : number);
             }
@@ -418,10 +416,9 @@ void SECSimulator::SetupStopCriteria() {
             fStopTails.fRequired = c.fFrequency;
             fStopTails.fThreshold = c.fThreshold;
             fStopTails.fbPercentile = c.fType == MCSPConst::kTailPercentile;
-            fStopTails.fbUpper = fStopTails.fbPercentile ? c.fThreshold >= 50.0
-                                                         : c.fSide == MCSPConst::kSideRight;
-            fStopTails.fZ =
-                MCMath_800::MCDistFun::IdfNorm(kTailsCiLevel * 0.5 + 0.5, 0.0, 1.0);
+            fStopTails.fbUpper =
+                fStopTails.fbPercentile ? c.fThreshold >= 50.0 : c.fSide == MCSPConst::kSideRight;
+            fStopTails.fZ = MCMath_800::MCDistFun::IdfNorm(kTailsCiLevel * 0.5 + 0.5, 0.0, 1.0);
         }
     }
 }
@@ -809,8 +806,7 @@ bool SECSimulator::ShouldStop() {
 // ---- Host-driven records ----------------------------------------------------------------------
 
 MCStatus SECSimulator::UpdateStatsForRecord(const std::vector<double>& predictors,
-                                            const std::vector<double>& targets,
-                                            int recordIndex) {
+                                            const std::vector<double>& targets, int recordIndex) {
     const bool shaped = predictors.size() == fvSimInputs.size() &&
                         targets.size() == static_cast<std::size_t>(fNValuesPerCase) &&
                         !fvTargets.empty();
@@ -900,9 +896,9 @@ MCStatus SECSimulator::RunCaseLoop() {
     SECReporter reporter;
     reporter.SetIterNum(fIteration);
     while (!ShouldStop() && !fpCancel->WillCancel()) {
-        MCStatus status = DrawAndScoreCase();
+        const MCStatus status = DrawAndScoreCase();
         if (!status.IsError() && UsesSensitivity() && fpScoreComputer) {
-            status = ComputeCaseSensitivity();
+            ComputeCaseSensitivity();
         }
         if (status.GetErrorCode() == MCSPStatus::kAttemptsExhausted) {
             outcome = status;
@@ -975,6 +971,13 @@ SECSimulator::MergeStatsFromThreads(const std::vector<std::unique_ptr<SECSimulat
             pool(to.fvPositiveDeltaStats, from.fvPositiveDeltaStats);
             pool(to.fvNegativeDeltaStats, from.fvNegativeDeltaStats);
             pool(to.fvVarianceContribStats, from.fvVarianceContribStats);
+            const auto add = [](std::vector<std::int64_t>& a, const std::vector<std::int64_t>& b) {
+                for (std::size_t k = 0; k < a.size() && k < b.size(); ++k) {
+                    a[k] += b[k];
+                }
+            };
+            add(to.fvDeltaSkipped, from.fvDeltaSkipped);
+            add(to.fvVarianceSkipped, from.fvVarianceSkipped);
             contHists[t].push_back(&from.fHistogram);
             contPlots[t].resize(to.fvScatterPlots.size());
             for (std::size_t j = 0; j < to.fvScatterPlots.size() && j < from.fvScatterPlots.size();
@@ -986,8 +989,7 @@ SECSimulator::MergeStatsFromThreads(const std::vector<std::unique_ptr<SECSimulat
             SECCategoricalTargetInfo& to = cat[t];
             const SECCategoricalTargetInfo& from = wCat[t];
             to.fCatStats.Pool(from.fCatStats);
-            for (std::size_t k = 0; k < to.fvProbStats.size() && k < from.fvProbStats.size();
-                 ++k) {
+            for (std::size_t k = 0; k < to.fvProbStats.size() && k < from.fvProbStats.size(); ++k) {
                 to.fvProbStats[k].Pool(from.fvProbStats[k]);
             }
             catHists[t].resize(to.fvProbHistograms.size());
@@ -1054,9 +1056,9 @@ MCStatus SECSimulator::CompleteStats() {
     covarStats.assign(static_cast<std::size_t>(nCorrelated), MCContStats());
     for (int k = 0; k < nCorrelated && k < fProvMeans.GetNVars(); ++k) {
         const auto ku = static_cast<std::size_t>(k);
-        covarStats[ku] = MCContStats::FromSummary(
-            fProvMeans.GetSumWeights(), fProvMeans.GetCount(), fProvMeans.GetMeans()[ku],
-            xprods.GetElem(k, k), fvCovarMin[ku], fvCovarMax[ku]);
+        covarStats[ku] = MCContStats::FromSummary(fProvMeans.GetSumWeights(), fProvMeans.GetCount(),
+                                                  fProvMeans.GetMeans()[ku], xprods.GetElem(k, k),
+                                                  fvCovarMin[ku], fvCovarMax[ku]);
     }
     std::vector<SECContinuousTargetInfo>& cont = results.GetContTargetInfo();
     std::vector<SECCategoricalTargetInfo>& cat = results.GetCateTargetInfo();

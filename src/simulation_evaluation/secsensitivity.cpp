@@ -6,6 +6,12 @@
 // changes of target t are the two ends of k's bar. For a linear model t = Σ a_k x_k they are
 // ±a_k δ_k exactly.
 //
+// A variant that cannot be evaluated (a shifted input outside its natural range, a failed or
+// missing score, no acceptable further case) is skipped and counted per covariate; the base
+// case is scored, accepted and accumulated exactly as with the measures off, and the further
+// cases come from a stream of their own, so that asking for a measure never changes what it
+// measures.
+//
 // Contribution to variance. With a second, independent case x', the record that takes x'_k for
 // input k and the case's own values elsewhere gives Y_k. Cov(Y, Y_k) = Var(E[Y | x_−k]), so
 // (V − Cov(Y, Y_k)) / V = E[Var(Y | x_−k)] / V, the share of the variance that input k accounts
@@ -23,12 +29,21 @@
 #include "mccommon/mcmv.h"
 
 #include <algorithm>
+#include <cstdint>
+#include <memory>
+#include <utility>
 
 namespace MCMCSP_800 {
 
 using MCCommon_800::MCMV;
 using MCCommon_800::MCStatus;
 using MCMath_800::MCContStats;
+
+namespace {
+//! Mixed into the base stream's seed to seed the further cases' stream (an odd constant of
+//! the golden ratio, so that neighbouring seeds do not give neighbouring streams).
+constexpr std::uint32_t kFurtherSeedMix = 0x9E3779B9u;
+} // namespace
 
 void SECSimulator::PrepareSensitivity() {
     fbDeltaMeasure = fpSettings->UseTornadoStddev();
@@ -56,24 +71,62 @@ void SECSimulator::PrepareSensitivity() {
         info.fvPositiveDeltaStats.assign(fbDeltaMeasure ? nCovariates : 0, MCContStats());
         info.fvNegativeDeltaStats.assign(fbDeltaMeasure ? nCovariates : 0, MCContStats());
         info.fvVarianceContribStats.assign(fbVarianceMeasure ? nCovariates : 0, MCContStats());
+        info.fvDeltaSkipped.assign(fbDeltaMeasure ? nCovariates : 0, 0);
+        info.fvVarianceSkipped.assign(fbVarianceMeasure ? nCovariates : 0, 0);
     }
 }
 
-MCStatus SECSimulator::ComputeCaseSensitivity() {
+bool SECSimulator::DrawFurtherCase() {
+    if (!fpFurtherStream) {
+        // Seeded from the base stream's seed, so a run stays reproducible for its seed, and
+        // parameterised as the base normal generator.
+        fpFurtherStream = std::make_unique<MCMath_800::MCURandom>(
+            fpStream->GetSeed() ^ kFurtherSeedMix, true, true, nullptr);
+        fFurtherValues = fRandomValues;
+        fFurtherValues.SetURNGPtr(fpFurtherStream.get());
+    }
+    // The draw runs on the further stream and generator in place of the base ones; the base
+    // case's cell, rejection count and normal scores are put back afterwards.
+    const int savedCell = fCrosstabCell;
+    const int savedRejections = fLastRejections;
+    fvSavedZ = fvZ;
+    MCMath_800::MCURandom* base = fpStream;
+    fpStream = fpFurtherStream.get();
+    std::swap(fRandomValues, fFurtherValues);
+    const MCStatus drawn = DrawAndScoreCase();
+    std::swap(fRandomValues, fFurtherValues);
+    fpStream = base;
+    fvFurther = fvCaseValues;
+    fvZ = fvSavedZ;
+    fCrosstabCell = savedCell;
+    fLastRejections = savedRejections;
+    return !drawn.IsError();
+}
+
+void SECSimulator::ComputeCaseSensitivity() {
     const std::size_t nCovariates = fvCorrelated.size();
     const std::size_t nTargets = fvContTargetPos.size();
     fvSavedInputs = fvCaseValues;
     fvSavedValues = fvScoreValues;
-    const auto restore = [this]() {
-        fvCaseValues = fvSavedInputs;
-        fvScoreValues = fvSavedValues;
-    };
-    // Differences of every continuous target from the case's own score.
-    const auto record = [&](std::vector<double>& table, std::size_t k) {
+    // Differences of every continuous target from the case's own score; missing (skipped)
+    // when the variant could not be scored.
+    const auto record = [&](std::vector<double>& table, std::size_t k, bool scored) {
         for (std::size_t t = 0; t < nTargets; ++t) {
             const auto pos = static_cast<std::size_t>(fvContTargetPos[t]);
-            table[t * nCovariates + k] = fvScoreValues[pos] - fvSavedValues[pos];
+            table[t * nCovariates + k] =
+                scored ? fvScoreValues[pos] - fvSavedValues[pos] : MCMV::Missing();
         }
+    };
+    // A shifted value outside the input's natural range is no value of its distribution (a
+    // LogNormal below 0, a Beta outside [0, 1]); the model is not asked about it.
+    const auto scoreShifted = [&](std::size_t k, double value) {
+        const SECInputGenerator& gen = fvCorrelated[k].fGenerator;
+        if ((!MCMV::IsMissing(gen.fLower) && value < gen.fLower) ||
+            (!MCMV::IsMissing(gen.fUpper) && value > gen.fUpper)) {
+            return false;
+        }
+        fvWorkInputs[static_cast<std::size_t>(fvCorrelated[k].fCasePos)] = value;
+        return !ScoreInputs(fvWorkInputs).IsError();
     };
 
     if (fbDeltaMeasure) {
@@ -85,37 +138,14 @@ MCStatus SECSimulator::ComputeCaseSensitivity() {
             }
             const auto pos = static_cast<std::size_t>(fvCorrelated[k].fCasePos);
             const double saved = fvSavedInputs[pos];
-            // The shifted values are not held to the truncation bounds or the natural range.
-            fvWorkInputs[pos] = saved + delta;
-            MCStatus status = ScoreInputs(fvWorkInputs);
-            if (status.IsError()) {
-                restore();
-                return status;
-            }
-            record(fvPosDiff, k);
-            fvWorkInputs[pos] = saved - delta;
-            status = ScoreInputs(fvWorkInputs);
-            if (status.IsError()) {
-                restore();
-                return status;
-            }
-            record(fvNegDiff, k);
+            record(fvPosDiff, k, scoreShifted(k, saved + delta));
+            record(fvNegDiff, k, scoreShifted(k, saved - delta));
             fvWorkInputs[pos] = saved;
         }
     }
 
     if (fbVarianceMeasure) {
-        // The base case keeps its own rejection count and contingency cell.
-        const int savedCell = fCrosstabCell;
-        const int savedRejections = fLastRejections;
-        const MCStatus drawn = DrawAndScoreCase();
-        fvFurther = fvCaseValues;
-        fCrosstabCell = savedCell;
-        fLastRejections = savedRejections;
-        if (drawn.IsError()) {
-            restore();
-            return drawn;
-        }
+        const bool further = DrawFurtherCase();
         fvWorkInputs = fvSavedInputs;
         for (std::size_t k = 0; k < nCovariates; ++k) {
             if (!fvCorrelated[k].fbVarianceContrib) {
@@ -123,22 +153,19 @@ MCStatus SECSimulator::ComputeCaseSensitivity() {
             }
             const auto pos = static_cast<std::size_t>(fvCorrelated[k].fCasePos);
             fvWorkInputs[pos] = fvFurther[pos];
-            const MCStatus status = ScoreInputs(fvWorkInputs);
-            if (status.IsError()) {
-                restore();
-                return status;
-            }
+            const bool scored = further && !ScoreInputs(fvWorkInputs).IsError();
             for (std::size_t t = 0; t < nTargets; ++t) {
                 const auto tpos = static_cast<std::size_t>(fvContTargetPos[t]);
                 const double c = fvContCentre[t];
                 fvProducts[t * nCovariates + k] =
-                    (fvSavedValues[tpos] - c) * (fvScoreValues[tpos] - c);
+                    scored ? (fvSavedValues[tpos] - c) * (fvScoreValues[tpos] - c)
+                           : MCMV::Missing();
             }
             fvWorkInputs[pos] = fvSavedInputs[pos];
         }
     }
-    restore();
-    return MCStatus();
+    fvCaseValues = fvSavedInputs;
+    fvScoreValues = fvSavedValues;
 }
 
 void SECSimulator::AccumulateSensitivity() {
@@ -149,12 +176,25 @@ void SECSimulator::AccumulateSensitivity() {
         for (std::size_t k = 0; k < nCovariates; ++k) {
             const std::size_t cell = t * nCovariates + k;
             const double delta = fvCorrelated[k].fTornadoDelta;
+            // A missing difference or product is a skipped evaluation: counted, and left out
+            // (the two sides of a delta separately).
             if (fbDeltaMeasure && !MCMV::IsMissing(delta) && delta > 0.0) {
-                info.fvPositiveDeltaStats[k].Update(fvPosDiff[cell]);
-                info.fvNegativeDeltaStats[k].Update(fvNegDiff[cell]);
+                const bool pos = !MCMV::IsMissing(fvPosDiff[cell]);
+                const bool neg = !MCMV::IsMissing(fvNegDiff[cell]);
+                if (pos) {
+                    info.fvPositiveDeltaStats[k].Update(fvPosDiff[cell]);
+                }
+                if (neg) {
+                    info.fvNegativeDeltaStats[k].Update(fvNegDiff[cell]);
+                }
+                info.fvDeltaSkipped[k] += (pos && neg) ? 0 : 1;
             }
             if (fbVarianceMeasure && fvCorrelated[k].fbVarianceContrib) {
-                info.fvVarianceContribStats[k].Update(fvProducts[cell]);
+                if (MCMV::IsMissing(fvProducts[cell])) {
+                    ++info.fvVarianceSkipped[k];
+                } else {
+                    info.fvVarianceContribStats[k].Update(fvProducts[cell]);
+                }
             }
         }
     }

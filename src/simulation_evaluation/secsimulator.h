@@ -71,13 +71,13 @@ public:
         MCSPConst::DistType fDistType = MCSPConst::kDistUnknown; //!< chosen distribution type
         bool fbCategorical = false; //!< drawn outside the copula, from a category table
         int fGroupIndex = -1;       //!< position in the correlated set or categorical list
-        double fLower = 0.0;    //!< natural lower bound narrowed by the minimum; missing if none
-        double fUpper = 0.0;    //!< natural upper bound narrowed by the maximum; missing if none
-        double fTruncMin = 0.0; //!< truncation minimum; missing when not set
-        double fTruncMax = 0.0; //!< truncation maximum; missing when not set
+        double fLower = 0.0;      //!< natural lower bound narrowed by the minimum; missing if none
+        double fUpper = 0.0;      //!< natural upper bound narrowed by the maximum; missing if none
+        double fTruncMin = 0.0;   //!< truncation minimum; missing when not set
+        double fTruncMax = 0.0;   //!< truncation maximum; missing when not set
         double fAcceptLow = 0.0;  //!< fTruncMin, or −∞ without one (the acceptance test)
         double fAcceptHigh = 0.0; //!< fTruncMax, or +∞ without one
-        bool fbOutput = true;   //!< SimInputSpecs::GetOutput
+        bool fbOutput = true;     //!< SimInputSpecs::GetOutput
     };
 
     //! One input of the correlated set.
@@ -168,26 +168,25 @@ public:
     //! inputs (filled with 0.0) when its size differs; missing values on failure.
     MCCommon_800::MCStatus SimulatePredictors(std::vector<double>& values);
 
-
     // ---- Scoring and targets -----------------------------------------------------------
 
     //! One target: where its value is read from a score, its filter and its chart range.
     struct Target {
-        std::string fName;                               //!< target name
+        std::string fName;                                  //!< target name
         const MCXML_800::IMCVariable* fpVariable = nullptr; //!< host's variable; may be null
-        bool fbCategorical = false;   //!< measurement kind 2 or 3 (or a cluster identifier)
-        int fListIndex = -1;          //!< position among the continuous or categorical targets
-        int fValuePos = -1;           //!< position of its value among the values of a score
-        int fNProbs = 0;              //!< category probabilities following the value
+        bool fbCategorical = false;        //!< measurement kind 2 or 3 (or a cluster identifier)
+        int fListIndex = -1;               //!< position among the continuous or categorical targets
+        int fValuePos = -1;                //!< position of its value among the values of a score
+        int fNProbs = 0;                   //!< category probabilities following the value
         std::vector<std::string> fvLabels; //!< category labels (categorical targets)
-        bool fbHasFilter = false;     //!< the plan gives it a filter range
-        double fFilterLow = 0.0;      //!< lower filter bound; lowest double when open
-        double fFilterHigh = 0.0;     //!< upper filter bound; highest double when open
-        bool fbIncludeLow = true;     //!< the lower bound belongs to the range
-        bool fbIncludeHigh = true;    //!< the upper bound belongs to the range
-        double fChartMin = 0.0;       //!< chart range; missing while open
-        double fChartMax = 0.0;       //!< chart range; missing while open
-        bool fbScatter = false;       //!< gets scatter plots against the inputs for output
+        bool fbHasFilter = false;          //!< the plan gives it a filter range
+        double fFilterLow = 0.0;           //!< lower filter bound; lowest double when open
+        double fFilterHigh = 0.0;          //!< upper filter bound; highest double when open
+        bool fbIncludeLow = true;          //!< the lower bound belongs to the range
+        bool fbIncludeHigh = true;         //!< the upper bound belongs to the range
+        double fChartMin = 0.0;            //!< chart range; missing while open
+        double fChartMax = 0.0;            //!< chart range; missing while open
+        bool fbScatter = false;            //!< gets scatter plots against the inputs for output
     };
 
     //! Resets the working values, computes the confidence interval's critical value from the
@@ -386,24 +385,23 @@ private:
     //! The index of distribution or value this iteration uses among `count` of them.
     std::size_t IterationIndex(std::size_t count) const;
 
-
     // ---- Scoring internals (secscoring.cpp) ----------------------------------------------
 
     enum class StopKind { kNone, kPointValue, kTails };
     //! The stop criterion of the run and its state.
     struct StopState {
         StopKind fKind = StopKind::kNone;
-        int fTarget = -1;          //!< index among the continuous targets
-        double fZ = 0.0;           //!< critical value of the criterion's level
-        double fThreshold = 0.0;   //!< point value: allowed half-width; tails: tail value
-        bool fbPercent = false;    //!< point value: threshold in percent of the mean
-        bool fbPercentile = false; //!< tails: percentile-type tail
-        bool fbUpper = true;       //!< tails: the upper tail
-        int fRequired = 0;         //!< tails: values required in the tail
-        int fTailCount = 0;        //!< tails: values counted in the tail
+        int fTarget = -1;            //!< index among the continuous targets
+        double fZ = 0.0;             //!< critical value of the criterion's level
+        double fThreshold = 0.0;     //!< point value: allowed half-width; tails: tail value
+        bool fbPercent = false;      //!< point value: threshold in percent of the mean
+        bool fbPercentile = false;   //!< tails: percentile-type tail
+        bool fbUpper = true;         //!< tails: the upper tail
+        int fRequired = 0;           //!< tails: values required in the tail
+        int fTailCount = 0;          //!< tails: values counted in the tail
         double fTailThreshold = 0.0; //!< tails: mean + h once active
         double fTailHalfWidth = 0.0; //!< tails: h at activation
-        bool fbActive = false;     //!< tails: the criterion is active
+        bool fbActive = false;       //!< tails: the criterion is active
     };
 
     //! Common part of the two target set-ups: filters, result records, scatter budget, stop
@@ -443,8 +441,13 @@ private:
 
     //! Sizes the working tables of the sensitivity measures and the results' vectors.
     void PrepareSensitivity();
-    //! The re-scored variants of the accepted current case (delta and variance measures).
-    MCCommon_800::MCStatus ComputeCaseSensitivity();
+    //! The re-scored variants of the accepted current case (delta and variance measures). A
+    //! variant that cannot be evaluated leaves its cells missing (skipped and counted); the
+    //! base case, its values and the base stream are never changed.
+    void ComputeCaseSensitivity();
+    //! The variance measure's further independent case, drawn from its own stream into
+    //! fvFurther; false when no acceptable case could be drawn.
+    bool DrawFurtherCase();
     //! Adds the current case's differences and products to the statistics.
     void AccumulateSensitivity();
     //! Positive and negative deltas and variance contributions of every continuous target.
@@ -490,7 +493,7 @@ private:
     std::vector<SECNortaPair> fvNortaPairs;  //!< pairs of the NORTA work
     //! The prepared inputs the NORTA work reads (shared by the master and its NORTA workers).
     std::shared_ptr<const std::vector<SECNortaMargin>> fpNortaMargins;
-    bool fbNortaTask = false;                //!< the thread task is NORTA work
+    bool fbNortaTask = false; //!< the thread task is NORTA work
 
     bool fbGenerationPrepared = false;     //!< the normal generator is set
     MCCommon_800::MCStatus fPrepareStatus; //!< outcome of the last preparation
@@ -504,7 +507,6 @@ private:
     int fFilteredCaseCount = 0; //!< rejected attempts
     int fValidCaseCount = 0;    //!< cases accepted
     int fInvalidCaseCount = 0;  //!< cases that failed
-
 
     // Scoring and statistics.
     std::unique_ptr<MCXML_800::IMCScoreComputer> fpScoreComputer; //!< this simulator's
@@ -524,45 +526,50 @@ private:
     std::vector<MCMath_800::MCContStats>* fpCovarStats = nullptr;
     std::vector<SECContinuousTargetInfo>* fpContInfo = nullptr;
     std::vector<SECCategoricalTargetInfo>* fpCatInfo = nullptr;
-    std::vector<double> fvCombined;       //!< correlated inputs, then targets
-    std::vector<double> fvInputChartMin;  //!< chart range per simulated input
+    std::vector<double> fvCombined;      //!< correlated inputs, then targets
+    std::vector<double> fvInputChartMin; //!< chart range per simulated input
     std::vector<double> fvInputChartMax;
-    MCMath_800::MCProvMeans fProvMeans;   //!< means and cross products
-    std::vector<double> fvCellCounts;     //!< accumulated contingency cells
-    double fCiZ = 0.0;                    //!< critical value of the means' intervals
-    int fScatterBudget = 100;             //!< scatter plots this simulator fills at most
-    bool fbChartsReady = false;           //!< chart accumulators created
-    StopState fStopPoint;                 //!< point-value stop criterion
-    StopState fStopTails;                 //!< tails stop criterion
-    int fStartRecords = 0;                //!< host-driven records seen in the start-up
+    MCMath_800::MCProvMeans fProvMeans;       //!< means and cross products
+    std::vector<double> fvCellCounts;         //!< accumulated contingency cells
+    double fCiZ = 0.0;                        //!< critical value of the means' intervals
+    int fScatterBudget = 100;                 //!< scatter plots this simulator fills at most
+    bool fbChartsReady = false;               //!< chart accumulators created
+    StopState fStopPoint;                     //!< point-value stop criterion
+    StopState fStopTails;                     //!< tails stop criterion
+    int fStartRecords = 0;                    //!< host-driven records seen in the start-up
     const SECSimulator* fpTemplate = nullptr; //!< the master of a worker (chart ranges)
-    std::vector<int> fvOutputInputs;      //!< simulated inputs marked for output
-    bool fbStopped = false;               //!< a stop criterion ended the case loop
-    std::int64_t fScoreCount = 0;         //!< scores computed
+    std::vector<int> fvOutputInputs;          //!< simulated inputs marked for output
+    bool fbStopped = false;                   //!< a stop criterion ended the case loop
+    std::int64_t fScoreCount = 0;             //!< scores computed
     std::vector<MCMath_800::MCContStats> fvStartInputStats;  //!< host-driven range search
     std::vector<MCMath_800::MCContStats> fvStartTargetStats; //!< host-driven range search
-    int fStartValid = 0;                  //!< valid start-up records
+    int fStartValid = 0;                                     //!< valid start-up records
 
     // Sink and progress.
-    MCXML_800::SECAppDataProcess* fpSink = nullptr; //!< host's, not owned
-    MCThread_800::IMCLock* fpLock = nullptr;        //!< host's, not owned
-    std::vector<double> fvSinkInputs;               //!< buffered cases' inputs
-    std::vector<double> fvSinkValues;               //!< buffered cases' score values
-    int fSinkCount = 0;                             //!< buffered cases
+    MCXML_800::SECAppDataProcess* fpSink = nullptr;             //!< host's, not owned
+    MCThread_800::IMCLock* fpLock = nullptr;                    //!< host's, not owned
+    std::vector<double> fvSinkInputs;                           //!< buffered cases' inputs
+    std::vector<double> fvSinkValues;                           //!< buffered cases' score values
+    int fSinkCount = 0;                                         //!< buffered cases
     MCCommon_800::ProgressListener* fpRecordListener = nullptr; //!< host's, not owned
     std::atomic<std::int64_t>* fpProgressCounter = nullptr;     //!< the algorithm's
 
     // Sensitivity measures.
-    bool fbDeltaMeasure = false;    //!< UseTornadoStddev
-    bool fbVarianceMeasure = false; //!< TornadoVariance
-    std::vector<double> fvPosDiff;  //!< continuous target × covariate
-    std::vector<double> fvNegDiff;  //!< continuous target × covariate
-    std::vector<double> fvProducts; //!< continuous target × covariate
+    bool fbDeltaMeasure = false;       //!< UseTornadoStddev
+    bool fbVarianceMeasure = false;    //!< TornadoVariance
+    std::vector<double> fvPosDiff;     //!< continuous target × covariate
+    std::vector<double> fvNegDiff;     //!< continuous target × covariate
+    std::vector<double> fvProducts;    //!< continuous target × covariate
     std::vector<double> fvSavedInputs; //!< the case's inputs
     std::vector<double> fvSavedValues; //!< the case's score values
     std::vector<double> fvWorkInputs;  //!< a variant of the case
     std::vector<double> fvFurther;     //!< the further independent case
-    std::vector<int> fvContTargetPos;  //!< value position of each continuous target
+    std::vector<double> fvSavedZ;      //!< the case's normal scores
+    //! Stream and normal generator of the further cases: apart from the base stream, so that
+    //! the variance measure does not move the base cases (created on first use).
+    std::unique_ptr<MCMath_800::MCURandom> fpFurtherStream;
+    MCMath_800::MCRandomValues fFurtherValues; //!< normal generator on fpFurtherStream
+    std::vector<int> fvContTargetPos;          //!< value position of each continuous target
     //! Centre of each continuous target's products in the variance measure: its pilot (or
     //! start-up) mean, 0 until one is known.
     std::vector<double> fvContCentre;

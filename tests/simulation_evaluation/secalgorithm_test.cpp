@@ -224,8 +224,46 @@ TEST(LinearModel, TornadoDeltasAndVarianceContributions) {
     EXPECT_NEAR(t.fvNegativeDelta[1], 3.0 * 1.5 * s1, 1e-9);
     EXPECT_NEAR(t.fvVarianceContrib[0], 16.0 / kTrueVariance, 0.03);
     EXPECT_NEAR(t.fvVarianceContrib[1], 12.0 / kTrueVariance, 0.03);
-    // Each case: once, twice per delta input, once for the further case, once per input.
-    EXPECT_EQ(run.counter.fCount.load(), 1000 + 100000LL * (1 + 4 + 1 + 2));
+    // Each case: once, x0 shifted both ways, x1 shifted where it stays inside [0, 4], once
+    // for the further case, once per input of the variance measure.
+    const std::int64_t x1Shifts =
+        t.fvPositiveDeltaStats[1].GetCount() + t.fvNegativeDeltaStats[1].GetCount();
+    EXPECT_EQ(run.counter.fCount.load(), 1000 + 100000LL * (1 + 2 + 1 + 2) + x1Shifts);
+    EXPECT_EQ(t.fvDeltaSkipped[0], 0);
+    // x1 ± 1.5·(4/√12) leaves [0, 4] on one side unless 1.73 ≤ x1 ≤ 2.27 (both sides fit).
+    EXPECT_NEAR(static_cast<double>(t.fvDeltaSkipped[1]), 100000.0 * (1.0 - 0.134), 700.0);
+    EXPECT_EQ(t.fvVarianceSkipped, (std::vector<std::int64_t>{0, 0}));
+}
+
+TEST(LinearModel, SensitivityMeasuresNeverChangeTheBaseRun) {
+    // x1 shifted by 1.5 standard deviations leaves its range for most cases, and the model
+    // fails on a tenth of all inputs (base cases and variants alike): the base results stay bit
+    // for bit those of a run without the measures, on one thread and on two.
+    for (const int threads : {1, 2}) {
+        LinearRun off(threads, 23u, 20000);
+        LinearRun on(threads, 23u, 20000);
+        on.tp.settings.SetTornadoDeltaStddev(1.5);
+        on.tp.settings.SetTornadoVariance(true);
+        auto failing = scorers::MakeFactory([]() -> std::unique_ptr<IMCScoreComputer> {
+            return std::make_unique<scorers::FailingScorer>(
+                std::vector<LinearTarget>{LinearRun::Model()}, 0.1, -1);
+        });
+        ASSERT_TRUE(off.Run(&failing).IsOK());
+        ASSERT_TRUE(on.Run(&failing).IsOK());
+        const SECContinuousTargetInfo& a = off.Target();
+        const SECContinuousTargetInfo& b = on.Target();
+        EXPECT_EQ(on.Results().GetValidCaseCount(), off.Results().GetValidCaseCount());
+        EXPECT_EQ(on.Results().GetInvalidCaseCount(), off.Results().GetInvalidCaseCount());
+        EXPECT_GT(b.fvDeltaSkipped[0], 0); // x0 shifted: the model fails on some variants
+        EXPECT_GT(b.fvVarianceSkipped[0], 0);
+        EXPECT_TRUE(SameBits({a.fMean, a.fStdDev, a.fMinimum, a.fMaximum},
+                             {b.fMean, b.fStdDev, b.fMinimum, b.fMaximum}));
+        EXPECT_TRUE(SameBits(a.fvPearsonCorrs, b.fvPearsonCorrs));
+        EXPECT_EQ(a.fHistogram.GetBinFreqCounts(), b.fHistogram.GetBinFreqCounts());
+        EXPECT_EQ(off.Results().GetSimulCorr().GetElem(1, 0),
+                  on.Results().GetSimulCorr().GetElem(1, 0));
+        EXPECT_GT(b.fvDeltaSkipped[1], 0);
+    }
 }
 
 TEST(LinearModel, ATargetIndependentOfAnInputHasNoEffectFromIt) {
