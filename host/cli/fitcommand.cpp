@@ -234,13 +234,47 @@ std::string Num(double x) {
     return MCMV::IsMissing(x) ? std::string("missing") : MCCommon_800::FormatDefault(x);
 }
 
+//! `x` in six significant digits, or in its shortest round-trip form with `exact`.
+std::string ParamNum(double x, bool exact) {
+    return exact && !MCMV::IsMissing(x) ? MCCommon_800::FormatRoundTrip(x) : Num(x);
+}
+
+//! Whether the distinct numbers of `values` print distinct with six significant digits. Where
+//! they do not (a Triangular fitted to values near 10^6 would read "min = 1e+06, max = 1e+06")
+//! the report writes each in its shortest round-trip form instead.
+bool DistinctInSixDigits(const std::vector<double>& values) {
+    for (std::size_t i = 0; i < values.size(); ++i) {
+        for (std::size_t j = 0; j < i; ++j) {
+            if (values[i] != values[j] && Num(values[i]) == Num(values[j])) {
+                return false;
+            }
+        }
+    }
+    return true;
+}
+
+//! The parameter names as the report shows them: the plan calls the Gamma's second parameter
+//! and the Exponential's parameter "scale", but both are rates (mean k/β and 1/θ).
+std::vector<std::string> ReportParamNames(DistType type, std::vector<std::string> names) {
+    if (type == kDistGamma && names.size() == 2) {
+        names[1] = "rate";
+    } else if (type == kDistExponential && names.size() == 1) {
+        names[0] = "rate";
+    }
+    return names;
+}
+
 //! "name = value, ..." in parameter-name order. Values beyond the names belong to the last
 //! name (the proportions of an empirical distribution); a long list shows its ends only.
 std::string Params(const std::vector<std::string>& names, const std::vector<double>& values) {
     std::string out;
     const std::size_t nScalars = names.empty() ? 0 : std::min(names.size() - 1, values.size());
+    // The plain numbers: the scalars, and the last name's value when it is a single one.
+    const std::size_t nPlain = values.size() - nScalars == 1 ? values.size() : nScalars;
+    const auto plainEnd = values.begin() + static_cast<std::ptrdiff_t>(nPlain);
+    const bool exact = !DistinctInSixDigits(std::vector<double>(values.begin(), plainEnd));
     for (std::size_t i = 0; i < nScalars; ++i) {
-        out += (i == 0 ? "" : ", ") + names[i] + " = " + Num(values[i]);
+        out += (i == 0 ? "" : ", ") + names[i] + " = " + ParamNum(values[i], exact);
     }
     if (nScalars == values.size()) {
         return out;
@@ -255,7 +289,7 @@ std::string Params(const std::vector<std::string>& names, const std::vector<doub
             }
             continue;
         }
-        list += (k == 0 ? "" : ", ") + Num(values[i]);
+        list += (k == 0 ? "" : ", ") + (nList == 1 ? ParamNum(values[i], exact) : Num(values[i]));
     }
     if (nList > 1 && names.size() >= 1) {
         list = "[" + list + "]" +
@@ -265,22 +299,79 @@ std::string Params(const std::vector<std::string>& names, const std::vector<doub
     return out;
 }
 
+//! The parameters of element `e` as the report shows them.
+std::string ElementParams(const DFCOutputStats::DFCVarDistElement& e) {
+    return Params(ReportParamNames(e.fDistType, e.fDistParamNames), e.fDistParams);
+}
+
+//! A p-value as what it is: a computed value ("0.213"), or what a table of critical values says
+//! of it: a bound ("< 0.005", "> 0.25") or the interval between two levels ("0.025–0.05").
+std::string PValueText(double p, double lower, double upper) {
+    const bool hasLower = !MCMV::IsMissing(lower);
+    const bool hasUpper = !MCMV::IsMissing(upper);
+    if (!hasLower && !hasUpper) {
+        return Num(p);
+    }
+    if (!hasLower) {
+        return "< " + Num(upper);
+    }
+    if (!hasUpper) {
+        return "> " + Num(lower);
+    }
+    return lower == upper ? Num(lower) : Num(lower) + "\u2013" + Num(upper);
+}
+
 //! The statistics an element holds, as "A-D 0.21 (p 0.85)"; "" when none.
 std::string Stats(const DFCOutputStats::DFCVarDistElement& e) {
     std::string out;
-    auto add = [&](const char* label, double stat, double p) {
+    auto add = [&](const char* label, double stat, const std::string& p) {
         if (MCMV::IsMissing(stat)) {
             return;
         }
         out += (out.empty() ? "" : "; ") + std::string(label) + " " + Num(stat);
-        if (!MCMV::IsMissing(p)) {
-            out += " (p " + Num(p) + ")";
+        if (p != "missing") {
+            out += " (p " + p + ")";
         }
     };
-    add("chi-square", e.fChiSquareFit, e.fChiSquarePValue);
-    add("A-D", e.fADFit, e.fADPValue);
-    add("K-S", e.fKSFit, e.fKSPValue);
+    add("chi-square", e.fChiSquareFit, Num(e.fChiSquarePValue));
+    if (!MCMV::IsMissing(e.fChiSquarePooled)) {
+        add("pooled", e.fChiSquarePooled,
+            Num(e.fChiSquarePooledPValue) + ", " + Num(e.fChiSquarePooledDF) + " df");
+    }
+    add("A-D", e.fADFit, PValueText(e.fADPValue, e.fADPValueLower, e.fADPValueUpper));
+    add("K-S", e.fKSFit, PValueText(e.fKSPValue, e.fKSPValueLower, e.fKSPValueUpper));
     return out;
+}
+
+//! "lnL -654.5, AIC 1313, BIC 1318, AICc 1313", or why the log-likelihood is missing; "" for an
+//! element without either (the Empirical).
+std::string Likelihood(const DFCOutputStats::DFCVarDistElement& e) {
+    if (!e.fLogLikReason.empty()) {
+        return "lnL missing: " + e.fLogLikReason;
+    }
+    if (MCMV::IsMissing(e.fLogLikelihood)) {
+        return "";
+    }
+    std::string out = "lnL " + Num(e.fLogLikelihood) + ", k " +
+                      std::to_string(e.fNEstimatedParams) + ", AIC " + Num(e.fAIC) + ", BIC " +
+                      Num(e.fBIC);
+    if (!MCMV::IsMissing(e.fAICc)) {
+        out += ", AICc " + Num(e.fAICc);
+    }
+    return out;
+}
+
+//! One candidate's line: name, parameters, statistics and likelihood.
+void PrintCandidate(std::ostream& out, const std::string& lead,
+                    const DFCOutputStats::DFCVarDistElement& e) {
+    out << lead << std::left << std::setw(12) << e.fDistName << std::right << " "
+        << ElementParams(e);
+    for (const std::string& part : {Stats(e), Likelihood(e)}) {
+        if (!part.empty()) {
+            out << "   " << part;
+        }
+    }
+    out << "\n";
 }
 
 std::string StatisticName(MeasureLevel level, GoodFitType type) {
@@ -288,6 +379,18 @@ std::string StatisticName(MeasureLevel level, GoodFitType type) {
         return "chi-square";
     }
     return type == kKolmogorovSmirnov ? "Kolmogorov-Smirnov" : "Anderson-Darling";
+}
+
+//! The best fit's p-value as the report shows it: with its table bounds, from its element.
+std::string BestPValueText(const DFCOutputStats::DFCVarDistInfo& info, GoodFitType type) {
+    const auto k = static_cast<std::size_t>(info.fDistBestType);
+    if (info.fMeasureLevel != kLevelContinuous || k >= info.fDistElements.size()) {
+        return Num(info.fBestFitPValue);
+    }
+    const DFCOutputStats::DFCVarDistElement& e = info.fDistElements[k];
+    return type == kKolmogorovSmirnov
+               ? PValueText(info.fBestFitPValue, e.fKSPValueLower, e.fKSPValueUpper)
+               : PValueText(info.fBestFitPValue, e.fADPValueLower, e.fADPValueUpper);
 }
 
 void PrintCovariate(std::ostream& out, const DFCOutputStats::DFCVarDistInfo& info,
@@ -300,7 +403,8 @@ void PrintCovariate(std::ostream& out, const DFCOutputStats::DFCVarDistInfo& inf
     out << ")\n";
     if (info.fDistBestType != kDistUnknown) {
         out << "  best fit   " << info.fDistBestName;
-        const std::string params = Params(info.fDistBestParamNames, info.fDistBestParams);
+        const std::string params = Params(
+            ReportParamNames(info.fDistBestType, info.fDistBestParamNames), info.fDistBestParams);
         if (!params.empty()) {
             out << "  " << params;
         }
@@ -308,7 +412,7 @@ void PrintCovariate(std::ostream& out, const DFCOutputStats::DFCVarDistInfo& inf
             out << "  " << StatisticName(info.fMeasureLevel, type) << " " << Num(info.fBestFitStat);
         }
         if (!MCMV::IsMissing(info.fBestFitPValue)) {
-            out << ", p-value " << Num(info.fBestFitPValue);
+            out << ", p-value " << BestPValueText(info, type);
         }
         out << "\n";
     } else {
@@ -321,23 +425,19 @@ void PrintCovariate(std::ostream& out, const DFCOutputStats::DFCVarDistInfo& inf
         int rank = 0;
         for (const auto& e : info.fReportedElements) {
             listed.insert(e.fDistType);
-            out << "    " << std::setw(2) << ++rank << ". " << std::left << std::setw(12)
-                << e.fDistName << std::right << " " << Params(e.fDistParamNames, e.fDistParams);
-            const std::string stats = Stats(e);
-            if (!stats.empty()) {
-                out << "   " << stats;
-            }
-            out << "\n";
+            std::ostringstream lead;
+            lead << "    " << std::setw(2) << ++rank << ". ";
+            PrintCandidate(out, lead.str(), e);
         }
     }
     bool header = false;
-    std::string dropped;
+    std::vector<const DFCOutputStats::DFCVarDistElement*> dropped;
     for (const auto& e : info.fDistElements) {
         if (listed.count(e.fDistType) != 0 || !allowed.IsDistAllowed(e.fDistType)) {
             continue;
         }
         if (!e.fbDistAllowed) {
-            dropped += (dropped.empty() ? "" : ", ") + e.fDistName;
+            dropped.push_back(&e);
             continue;
         }
         if (!header) {
@@ -345,16 +445,15 @@ void PrintCovariate(std::ostream& out, const DFCOutputStats::DFCVarDistInfo& inf
                                    : "  other candidates\n");
             header = true;
         }
-        out << "        " << std::left << std::setw(12) << e.fDistName << std::right << " "
-            << Params(e.fDistParamNames, e.fDistParams);
-        const std::string stats = Stats(e);
-        if (!stats.empty()) {
-            out << "   " << stats;
-        }
-        out << "\n";
+        PrintCandidate(out, "        ", e);
     }
     if (!dropped.empty()) {
-        out << "  dropped    " << dropped << "\n";
+        out << "  dropped\n";
+        for (const DFCOutputStats::DFCVarDistElement* e : dropped) {
+            const std::string reason = MCMCSP_800::DFCDropReasonText(e->fDropReason);
+            out << "        " << std::left << std::setw(12) << e->fDistName << std::right << " "
+                << (reason.empty() ? "no reason recorded" : reason) << "\n";
+        }
     }
 }
 

@@ -327,4 +327,28 @@ TEST(McsimFit, MissingFileIsNamed) {
     EXPECT_NE(run.err.find("absent.csv: cannot open the data file"), std::string::npos) << run.err;
 }
 
+// The report of the fit diagnostics on the inputs that once misled it: values near 10^6 that
+// six digits cannot tell apart, a sample whose Uniform and Triangular end at its extremes (their
+// A² over the values inside, never negative), under-dispersed counts (no negative binomial),
+// rates named as rates, table p-values as bounds, and a reason for every dropped candidate.
+TEST(McsimFit, ReportsDiagnosticsAndDropReasons) {
+    hosttest::TempDir dir;
+    std::string text = "x,c\n";
+    const int counts[] = {0, 1, 1, 2, 2, 2, 3, 3, 4, 5};
+    for (int i = 0; i < 1000; ++i) {
+        text += (i < 300 ? "1000000.1" : (i < 700 ? "1000000.5" : "1000000.9")) + std::string(",") +
+                std::to_string(counts[i % 10]) + "\n";
+    }
+    const CommandRun run = Mcsim({"fit", dir.Write("d.csv", text)}, dir);
+    ASSERT_EQ(run.status, 0) << run.err;
+    for (const char* part :
+         {"Uniform      min = 1000000.1, max = 1000000.9   A-D 154.5",
+          "lnL missing: the density is 0 at a sample value", ", rate = ", "(p < 0.005)",
+          "Beta         a value lies outside the family's support",
+          "Negbinomial  variance not above the mean", "; pooled ", "lnL -"}) {
+        EXPECT_NE(run.out.find(part), std::string::npos) << part << "\n" << run.out;
+    }
+    EXPECT_EQ(run.out.find("A-D -"), std::string::npos) << run.out;
+}
+
 } // namespace
