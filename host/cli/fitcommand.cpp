@@ -352,11 +352,18 @@ std::string Likelihood(const DFCOutputStats::DFCVarDistElement& e) {
     if (MCMV::IsMissing(e.fLogLikelihood)) {
         return "";
     }
-    std::string out = "lnL " + Num(e.fLogLikelihood) + ", k " +
-                      std::to_string(e.fNEstimatedParams) + ", AIC " + Num(e.fAIC) + ", BIC " +
-                      Num(e.fBIC);
+    // Two decimals, not six significant digits: on a large field the criteria of two
+    // candidates run to millions and differ in the units.
+    const auto fixed = [](double x) {
+        std::ostringstream os;
+        os << std::fixed << std::setprecision(2) << x;
+        return os.str();
+    };
+    std::string out = "lnL " + fixed(e.fLogLikelihood) + ", k " +
+                      std::to_string(e.fNEstimatedParams) + ", AIC " + fixed(e.fAIC) + ", BIC " +
+                      fixed(e.fBIC);
     if (!MCMV::IsMissing(e.fAICc)) {
-        out += ", AICc " + Num(e.fAICc);
+        out += ", AICc " + fixed(e.fAICc);
     }
     return out;
 }
