@@ -148,12 +148,13 @@ struct ReportWarning {
 
 //! Everything the command reports about one run.
 struct SimulationReport {
-    std::string fPlanPath;   //!< the plan file
-    std::string fModelPath;  //!< the model file
-    int fCases = 0;          //!< case limit per iteration
-    std::uint32_t fSeed = 0; //!< seed
-    int fThreads = 1;        //!< worker threads
-    double fCiLevel = 0.95;  //!< confidence level
+    std::string fPlanPath;     //!< the plan file
+    std::string fModelPath;    //!< the model file
+    int fCases = 0;            //!< case limit per iteration
+    std::uint32_t fSeed = 0;   //!< seed
+    int fThreads = 1;          //!< worker threads the run used
+    int fThreadsRequested = 1; //!< worker threads the settings allowed
+    double fCiLevel = 0.95;    //!< confidence level
     //! Tornado delta in standard deviations; missing when the measure is off.
     double fTornadoDelta = MCCommon_800::MCMV::Missing();
     bool fbVariance = false;                   //!< contribution to variance computed

@@ -138,6 +138,7 @@ Json ReportToJson(const SimulationReport& report) {
     doc["settings"] = Json{{"cases", report.fCases},
                            {"seed", report.fSeed},
                            {"threads", report.fThreads},
+                           {"threads_requested", report.fThreadsRequested},
                            {"confidence_level", report.fCiLevel},
                            {"tornado_delta_sd", Number(report.fTornadoDelta)},
                            {"contribution_to_variance", report.fbVariance}};

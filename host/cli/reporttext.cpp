@@ -287,8 +287,12 @@ void WriteTextReport(std::ostream& out, const SimulationReport& report) {
     out << "simulation of " << report.fPlanPath << " with the model " << report.fModelPath << "\n  "
         << report.fCases << " cases" << (report.fvIterations.size() > 1 ? " per iteration" : "")
         << ", seed " << report.fSeed << ", " << report.fThreads
-        << (report.fThreads == 1 ? " thread" : " threads") << ", " << PercentText(report.fCiLevel)
-        << " confidence intervals";
+        << (report.fThreads == 1 ? " thread" : " threads")
+        << (report.fThreads < report.fThreadsRequested
+                ? " (" + std::to_string(report.fThreadsRequested) +
+                      " allowed; this plan runs on one)"
+                : std::string())
+        << ", " << PercentText(report.fCiLevel) << " confidence intervals";
     if (!MCMV::IsMissing(report.fTornadoDelta)) {
         out << ", tornado delta " << Num(report.fTornadoDelta) << " sd";
     }

@@ -345,7 +345,16 @@ SimulationReport MakeReport(const SimulateOptions& options, const PreparedPlan& 
     report.fModelPath = prepared.fModelPath;
     report.fCases = plan.GetMaxCases();
     report.fSeed = settings.GetSeed();
-    report.fThreads = settings.GetMaxThreadNum();
+    // The threads the run really used: a stop criterion or categorical targets of a model
+    // without a predicted field run on one, whatever was asked for.
+    report.fThreadsRequested = settings.GetMaxThreadNum();
+    report.fThreads = 0;
+    for (const SECOutputStats* r : results) {
+        report.fThreads = std::max(report.fThreads, r->GetThreadsUsed());
+    }
+    if (report.fThreads == 0) {
+        report.fThreads = report.fThreadsRequested;
+    }
     report.fCiLevel = settings.GetCiLevel();
     if (settings.UseTornadoStddev()) {
         report.fTornadoDelta = settings.GetTornadoDeltaStddev();

@@ -225,6 +225,10 @@ MCStatus SECAlgorithm::RunIteration(SECSimulator& master, MCXML_800::IMCSPScoreF
         //        completed too, so the host can show what was done.
         status = master.MergeStatsFromThreads(workers);
         workers.clear();
+        SECOutputStats* results = nullptr;
+        if (master.GetOutputStats(results).IsOK() && results != nullptr) {
+            results->SetThreadsUsed(nThreads);
+        }
         if (!status.IsError()) {
             status = master.CompleteStats();
         }
@@ -294,7 +298,8 @@ MCStatus SECAlgorithm::SimulatePredictors(std::vector<double>& values, int iter)
         !fvSimulators[static_cast<std::size_t>(index)]) {
         return fStatus = MCStatus(MCSPStatus::kNoData, false);
     }
-    const MCStatus status = fvSimulators[static_cast<std::size_t>(index)]->SimulatePredictors(values);
+    const MCStatus status =
+        fvSimulators[static_cast<std::size_t>(index)]->SimulatePredictors(values);
     ++fCaseCounter;
     return status;
 }

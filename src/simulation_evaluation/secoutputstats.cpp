@@ -32,6 +32,7 @@ public:
     int fInvalidCaseCount = 0;                          //!< cases that failed
     const MCProvMeans* fpProvMeans = nullptr;           //!< inputs then targets, not owned
     bool fbStopCriteria = true;                         //!< a stop criterion ended the run
+    int fThreadsUsed = 0;                               //!< worker threads of the run
     std::vector<SECContinuousTargetInfo> fvContTargets; //!< one per continuous target
     std::vector<SECCategoricalTargetInfo> fvCateTargets; //!< one per categorical target
     std::vector<std::string> fvCovariateNames;           //!< inputs of the correlated set
@@ -181,6 +182,12 @@ bool SECOutputStats::GetStopCriteria() const {
 }
 void SECOutputStats::SetStopCriteria(bool stopped) {
     fpImpl->fbStopCriteria = stopped;
+}
+int SECOutputStats::GetThreadsUsed() const {
+    return fpImpl->fThreadsUsed;
+}
+void SECOutputStats::SetThreadsUsed(int n) {
+    fpImpl->fThreadsUsed = n;
 }
 
 const std::vector<SECContinuousTargetInfo>& SECOutputStats::GetContTargetInfo() const {

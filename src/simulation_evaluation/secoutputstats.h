@@ -147,6 +147,11 @@ public:
     //! True when a stop criterion ended the run.
     bool GetStopCriteria() const;
     void SetStopCriteria(bool stopped);
+    //! Worker threads the run of this iteration really used: one, whatever the settings allow,
+    //! for a stop criterion, a sink without a lock, or categorical targets of a score without a
+    //! predicted field; 0 until the run has set it.
+    int GetThreadsUsed() const;
+    void SetThreadsUsed(int n);
 
     // ---- Targets -------------------------------------------------------------------------
 

@@ -247,9 +247,19 @@ TEST(McsimSimulate, SameSeedGivesIdenticalFilesAndThreadCountsAllRun) {
                                       "--json", dir.File("t.json")});
         ASSERT_EQ(run.status, 0) << run.err;
         const Json doc = Json::parse(hosttest::ReadFile(dir.File("t.json")));
-        EXPECT_EQ(doc.at("settings").at("threads").get<int>(), std::stoi(threads));
+        // The categorical volume_band has no predicted field: the run uses one thread.
+        EXPECT_EQ(doc.at("settings").at("threads_requested").get<int>(), std::stoi(threads));
+        EXPECT_EQ(doc.at("settings").at("threads").get<int>(), 1);
         EXPECT_EQ(doc.at("iterations")[0].at("counts").at("valid").get<int>(), 3001);
     }
+    // A stop criterion runs on one thread whatever is asked: the header and the JSON say so.
+    const CommandRun stop = Mcsim({"simulate", kExamples + "/plans/profit_plan.xml", "--threads",
+                                   "2", "--json", dir.File("s.json")});
+    ASSERT_EQ(stop.status, 0) << stop.err;
+    const Json doc = Json::parse(hosttest::ReadFile(dir.File("s.json")));
+    EXPECT_EQ(doc.at("settings").at("threads").get<int>(), 1);
+    EXPECT_EQ(doc.at("settings").at("threads_requested").get<int>(), 2);
+    EXPECT_NE(stop.out.find("1 thread (2 allowed"), std::string::npos) << stop.out;
 }
 
 TEST(McsimSimulate, CasesFileHoldsEveryCaseWithLabels) {
