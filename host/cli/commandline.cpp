@@ -12,9 +12,12 @@
 namespace MCHost {
 
 const char* const kExitStatusHelp =
-    "Exit status: 0 done; 1 the work failed (bad data, plan or model); 2 usage error (unknown "
-    "option, bad value, unusable output file; nothing was done); 130, 143, 129 interrupted by "
-    "SIGINT (Ctrl-C), SIGTERM, SIGHUP (no output file is left behind).";
+    "Exit status:\n"
+    "  0    done\n"
+    "  1    the work failed: bad data, plan or model\n"
+    "  2    usage error: unknown option, bad value, unusable output file; nothing was done\n"
+    "  130  interrupted by Ctrl-C (SIGINT); 143 by SIGTERM; 129 by SIGHUP; no output file is "
+    "left";
 
 namespace {
 
@@ -106,7 +109,7 @@ CLI::Validator WholeNumber(std::int64_t min, std::int64_t max) {
             text = std::to_string(static_cast<std::int64_t>(x));
             return std::string();
         },
-        "INT " + std::to_string(min) + ".." + std::to_string(max));
+        std::to_string(min) + ".." + std::to_string(max));
 }
 
 CLI::Validator PositiveUpTo(double max) {
@@ -119,7 +122,7 @@ CLI::Validator PositiveUpTo(double max) {
             }
             return std::string();
         },
-        "NUMBER in (0, " + MCCommon_800::FormatDefault(max) + "]");
+        "(0, " + MCCommon_800::FormatDefault(max) + "]");
 }
 
 void CheckOutputFiles(const std::vector<NamedFile>& inputs, const std::vector<NamedFile>& outputs) {
