@@ -17,6 +17,7 @@
 #include <boost/math/distributions/weibull.hpp>
 #include <boost/math/special_functions/gamma.hpp>
 
+#include <algorithm>
 #include <array>
 #include <cmath>
 #include <limits>
@@ -498,10 +499,12 @@ template <class F, bool kDiscrete> double BoostVariable(const double* p, double 
     return kDiscrete ? std::floor(x - F::Shift(p)) : x - F::Shift(p);
 }
 
-//! A count quantile made exact: Boost finds the root of the continuous extension of F to a
-//! few ulps, which can land one whole number off where F(k) lies within those ulps of u. The
-//! two loops move to the smallest k with F(k) ≥ u by the distribution function itself (each
-//! runs at most a step or two).
+//! A count quantile made exact: Boost finds the root of the continuous extension of F, which
+//! can land a whole number off where F(k) lies within a few ulps of u, and far off in extreme
+//! tails of huge counts (a Binomial's upper tail beyond 1e-17). The smallest k with F(k) ≥ u
+//! is then found by the distribution function itself: Boost's answer is checked against its
+//! neighbour (two evaluations when it is right), else bracketed by doubling steps from it and
+//! bisected. Missing when no bracket is found (F missing on the way).
 template <class F, bool kUpper> double ExactCount(const double* p, double k, double u) {
     if (MCMV::IsMissing(k)) {
         return k;
@@ -512,13 +515,38 @@ template <class F, bool kUpper> double ExactCount(const double* p, double k, dou
     const auto reached = [&](double j) {
         return kUpper ? CcdfOf(d, s, j) <= u : CdfOf(d, s, j) >= u;
     };
-    for (int i = 0; i < 64 && k > s.fLo && reached(k - 1.0); ++i) {
-        k -= 1.0;
+    const double below = s.fLo - 1.0;               // F(below) = 0: never reached for u > 0
+    constexpr double kMaxStep = 4503599627370496.0; // 2^52: whole numbers stay exact
+    double lo = k;                                  // not reached (or below)
+    double hi = k;                                  // reached
+    if (reached(k)) {
+        for (double step = 1.0;; step *= 2.0) {
+            lo = std::max(k - step, below);
+            if (lo == below || !reached(lo)) {
+                break;
+            }
+            hi = lo;
+            if (step > kMaxStep) {
+                return Missing();
+            }
+        }
+    } else {
+        for (double step = 1.0;; step *= 2.0) {
+            hi = MCMV::IsMissing(s.fHi) ? k + step : std::min(k + step, s.fHi);
+            if (reached(hi)) {
+                break;
+            }
+            lo = hi;
+            if (step > kMaxStep || (!MCMV::IsMissing(s.fHi) && hi == s.fHi)) {
+                return Missing();
+            }
+        }
     }
-    for (int i = 0; i < 64 && (MCMV::IsMissing(s.fHi) || k < s.fHi) && !reached(k); ++i) {
-        k += 1.0;
+    while (hi - lo > 1.0) {
+        const double mid = std::floor(0.5 * (lo + hi));
+        (reached(mid) ? hi : lo) = mid;
     }
-    return k;
+    return hi;
 }
 
 //! The row of family F: the generic F, 1 − F and F⁻¹ over Boost, shifted by F::Shift, with

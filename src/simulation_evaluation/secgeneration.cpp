@@ -546,9 +546,13 @@ double CountInverse(const SECInputGenerator& gen, double z) {
         const auto cell = std::upper_bound(table.begin(), table.end(), u) - table.begin();
         return gen.fCountBase + static_cast<double>(cell);
     }
+    // A tail probability that underflows (|z| beyond about 38) is taken as the smallest positive
+    // double: the quantile of 0 would be the end of the support, which may carry no mass.
+    constexpr double kTiny = std::numeric_limits<double>::denorm_min();
     const double* p = gen.fvParams.data();
-    return z <= 0.0 ? gen.fpFamily->fQuantile(p, u)
-                    : gen.fpFamily->fQuantileComplement(p, MCDistFun::CdfStdNorm(-z));
+    return z <= 0.0 ? gen.fpFamily->fQuantile(p, std::max(u, kTiny))
+                    : gen.fpFamily->fQuantileComplement(
+                          p, std::max(MCDistFun::CdfStdNorm(-z), kTiny));
 }
 
 } // namespace
