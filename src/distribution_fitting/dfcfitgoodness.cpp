@@ -811,6 +811,12 @@ DFCFittedCdf::DFCFittedCdf(DistType type, const std::vector<double>& params) : f
         fLogNorm = boost::math::lgamma(fP0, MCMathPolicy()) - fP0 * std::log(fP1);
     } else if (type == kDistNormal || type == kDistLognormal) {
         fLogNorm = std::log(fP1) + kLnSqrtTwoPi;
+    } else if (type == kDistUniform) {
+        fLogNorm = std::log(fP1 - fP0);
+    } else if (type == kDistExponential) {
+        fLogNorm = -std::log(fP0);
+    } else if (type == kDistWeibull) {
+        fLogNorm = -std::log(fP1 / fP0);
     } else if (type == kDistBeta) {
         const double beta = boost::math::beta(fP0, fP1, MCMathPolicy());
         fLogNorm = beta > 0.0 && std::isfinite(beta)
@@ -819,12 +825,47 @@ DFCFittedCdf::DFCFittedCdf(DistType type, const std::vector<double>& params) : f
     }
 }
 
+// The closed forms below are the fast forms of the family table's F for the candidates that
+// are evaluated at every value (no carry): the table's Boost distributions check their
+// parameters at every call, which the fit, with parameters checked once, need not pay for.
+// Gamma and Beta go to the table. LogNormal (a = geometric mean, b = sd of ln x): Φ(ln(x/a)/b)
+// for x > 0. Normal: Φ((x-μ)/σ). Triangular (min a, max b, mode c): (x-a)²/((b-a)(c-a)) on
+// [a, c), 1 - (b-x)²/((b-a)(b-c)) on [c, b]. Uniform: (x-a)/(b-a). Weibull (scale a, shape b,
+// location c): 1 - exp(-((x-c)/a)^b) for x > c. Exponential (rate λ): 1 - exp(-λx). Each is 0
+// below and 1 above its support; 1 - exp(-t) is evaluated as -expm1(-t), exact for small t.
 double DFCFittedCdf::operator()(double x) const {
     if (!fbValid || MCMV::IsMissing(x)) {
         return kMissing;
     }
-    const double p[3] = {fP0, fP1, fP2};
-    return fpFamily->fCdf(p, x);
+    switch (fType) {
+    case kDistLognormal:
+        return x > 0.0 ? MCDistFun::CdfStdNorm(std::log(x / fP0) / fP1) : 0.0;
+    case kDistNormal:
+        return MCDistFun::CdfNorm(x, fP0, fP1);
+    case kDistTriangular: {
+        const double a = fP0;
+        const double b = fP1;
+        const double c = fP2;
+        if (x <= a) {
+            return 0.0;
+        }
+        if (x >= b) {
+            return 1.0;
+        }
+        return x < c ? (x - a) * (x - a) / ((b - a) * (c - a))
+                     : 1.0 - (b - x) * (b - x) / ((b - a) * (b - c));
+    }
+    case kDistUniform:
+        return x < fP0 ? 0.0 : (x > fP1 ? 1.0 : (x - fP0) / (fP1 - fP0));
+    case kDistWeibull:
+        return x > fP2 ? -std::expm1(-std::pow((x - fP2) / fP0, fP1)) : 0.0;
+    case kDistExponential:
+        return x >= 0.0 ? -std::expm1(-x * fP0) : 0.0;
+    default: {
+        const double p[3] = {fP0, fP1, fP2};
+        return fpFamily->fCdf(p, x);
+    }
+    }
 }
 
 double DFCFittedCdf::LogDensity(double x) const {
@@ -854,11 +895,24 @@ double DFCFittedCdf::LogDensity(double x) const {
         const double t = std::log(x / fP0) / fP1;
         return -0.5 * t * t - std::log(x) - fLogNorm;
     }
-    default: {
-        const double p[3] = {fP0, fP1, fP2};
-        return fpFamily->fLogDensity(p, x);
+    case kDistUniform:
+        return x >= fP0 && x <= fP1 ? -fLogNorm : -kInf;
+    case kDistExponential:
+        return x >= 0.0 ? -fLogNorm - fP0 * x : -kInf;
+    case kDistWeibull: {
+        // ln(b/a) + (b - 1)·ln w - w^b with w = (x - c)/a; the ends through the table.
+        const double w = (x - fP2) / fP0;
+        if (!(w > 0.0) || !std::isfinite(w)) {
+            break;
+        }
+        const double lnW = std::log(w);
+        return -fLogNorm + (fP1 - 1.0) * lnW - std::exp(fP1 * lnW);
     }
+    default:
+        break;
     }
+    const double p[3] = {fP0, fP1, fP2};
+    return fpFamily->fLogDensity(p, x);
 }
 
 // ------------------------------------------------------------------------------------------

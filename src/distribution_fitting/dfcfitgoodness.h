@@ -119,7 +119,8 @@ private:
     double fP2 = 0.0;                         //!< third parameter
     bool fbValid = false;                     //!< the parameters are usable
     double fLogNorm = 0.0; //!< ln Γ(α) - α·ln β (Gamma), ln B(a, b) (Beta), ln(σ·√(2π))
-                           //!< (Normal, LogNormal)
+                           //!< (Normal, LogNormal), ln(b - a) (Uniform), -ln λ (Exponential),
+                           //!< -ln(b/a) (Weibull): the constant of ln f
 };
 
 //! Running sums of the EDF statistics over sorted probabilities u_1 ≤ u_2 ≤ ..., so that they
