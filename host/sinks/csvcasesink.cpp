@@ -55,6 +55,9 @@ void CsvCaseSink::WriteValue(double value, const std::vector<std::string>& label
 
 void CsvCaseSink::BeginData(const std::vector<std::string>& targetNames, int nProbabilities,
                             int nIterations) {
+    // Lock order: the process's commit lock, then the sink's (a command commits its outputs
+    // under the commit lock, and the writer takes it when it is created, committed or aborted).
+    const OutputCommitScope commitScope;
     std::lock_guard<std::mutex> guard(fMutex);
     if (fpWriter || !fError.empty()) {
         return;
@@ -143,6 +146,9 @@ void CsvCaseSink::AddCase(const std::vector<double>& inputs, const std::vector<d
 }
 
 bool CsvCaseSink::Commit() {
+    // Lock order: the process's commit lock, then the sink's (a command commits its outputs
+    // under the commit lock, and the writer takes it when it is created, committed or aborted).
+    const OutputCommitScope commitScope;
     std::lock_guard<std::mutex> guard(fMutex);
     if (!fError.empty()) {
         if (fpWriter) {
@@ -162,6 +168,9 @@ bool CsvCaseSink::Commit() {
 }
 
 void CsvCaseSink::Abort() {
+    // Lock order: the process's commit lock, then the sink's (a command commits its outputs
+    // under the commit lock, and the writer takes it when it is created, committed or aborted).
+    const OutputCommitScope commitScope;
     std::lock_guard<std::mutex> guard(fMutex);
     if (fpWriter) {
         fpWriter->Abort();
