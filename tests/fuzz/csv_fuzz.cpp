@@ -11,6 +11,7 @@
 // one of its codes 0..k-1 and an ordinal field's value one of its categories; both passes must
 // hand out the same number of records, which is the dictionary's row count.
 #include "common/hosterror.h"
+#include "data/csvreader.h"
 #include "data/csvrecorditer.h"
 #include "data/datadictionary.h"
 #include "distribution_fitting/dfcalgorithm.h"
@@ -28,6 +29,7 @@
 #include <filesystem>
 #include <fstream>
 #include <string>
+#include <string_view>
 
 namespace {
 
@@ -250,11 +252,19 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
             Broken("cannot write the scratch file");
         }
     }
-    // As `mcsim fit` reads a file by default, then with tight limits so that the paths that
-    // refuse too many categories and the other delimiter are taken as well.
-    ReadFile(path, MCHost::DataOptions());
+    // As `mcsim fit` reads a file without --delimiter (the separator guessed from its first
+    // rows), then with tight limits, a semicolon and decimal commas, so that the paths that
+    // refuse too many categories, the other delimiter and the comma-to-point rewriting are
+    // taken as well.
+    MCHost::DataOptions guessed;
+    const MCHost::SeparatorGuess guess = MCHost::GuessSeparator(
+        MCHost::ReadSeparatorSample(path),
+        std::string_view(MCHost::kSeparatorCandidates, sizeof MCHost::kSeparatorCandidates));
+    guessed.fDelimiter = guess.fDelimiter;
+    ReadFile(path, guessed);
     MCHost::DataOptions tight;
     tight.fDelimiter = ';';
+    tight.fbDecimalComma = true;
     tight.fMaxOrdinalValues = 2;
     tight.fMaxCategories = 3;
     ReadFile(path, tight);
