@@ -1,10 +1,10 @@
 #include "simulation_evaluation/secnorta.h"
 
 #include "component/mcspcomponent.h"
+#include "mcmath/mcdistfun.h"
 #include "mcmath/mceigen.h"
 
 #include <boost/math/quadrature/gauss.hpp>
-#include <boost/math/special_functions/erf.hpp>
 #include <boost/math/tools/toms748_solve.hpp>
 
 #include <algorithm>
@@ -48,14 +48,16 @@ constexpr double kTailFloor = 1e-16;
 constexpr double kRootBracket = 1e-12;
 
 constexpr double kInvSqrt2Pi = 0.39894228040143267794;
-constexpr double kSqrt2 = 1.41421356237309504880;
 
 double Pdf(double z) {
     return kInvSqrt2Pi * std::exp(-0.5 * z * z);
 }
+//! Φ̄(z) = Φ(−z), the standard normal upper tail.
 double UpperTail(double z) {
-    return 0.5 * std::erfc(z / kSqrt2);
+    return MCMath_800::MCDistFun::CdfStdNorm(-z);
 }
+//! Φ⁻¹(p), with the ends of the scale for p = 0 and p = 1 (the cut below a count's first value
+//! or above its last).
 double NormalQuantile(double p) {
     if (!(p > 0.0)) {
         return -std::numeric_limits<double>::infinity();
@@ -63,7 +65,7 @@ double NormalQuantile(double p) {
     if (!(p < 1.0)) {
         return std::numeric_limits<double>::infinity();
     }
-    return -kSqrt2 * boost::math::erfc_inv(2.0 * p);
+    return MCMath_800::MCDistFun::IdfNorm(p, 0.0, 1.0);
 }
 
 //! The 20-point Gauss–Legendre rule on [−1, 1] (Boost stores the non-negative half).
