@@ -5,6 +5,7 @@
 //
 //   BM_SimulateWSim1/threads:n   cases per second of a whole run on n workers (wall clock)
 //   BM_SimulateWSim1_Tornado     the same on one worker with the delta and variance measures
+//   BM_SimulateWSim1_Added       one worker with the quantile summary and first-order indices
 #include <benchmark/benchmark.h>
 
 #include "wsim1_plan.h"
@@ -70,9 +71,10 @@ public:
     }
 };
 
-void RunWSim1(benchmark::State& state, int threads, bool tornado) {
+void RunWSim1(benchmark::State& state, int threads, bool tornado, bool added = false) {
     wsim1::WSim1 w(false, threads);
     w.plan.SetMaxCases(kCases);
+    w.settings.SetQuantilesAndIndices(added);
     if (tornado) {
         w.settings.SetTornadoDeltaStddev(1.0);
         w.settings.SetTornadoVariance(true);
@@ -108,6 +110,11 @@ void BM_SimulateWSim1_Tornado(benchmark::State& state) {
     RunWSim1(state, 1, true);
 }
 BENCHMARK(BM_SimulateWSim1_Tornado)->Unit(benchmark::kMillisecond)->UseRealTime();
+
+void BM_SimulateWSim1_Added(benchmark::State& state) {
+    RunWSim1(state, 1, false, true);
+}
+BENCHMARK(BM_SimulateWSim1_Added)->Unit(benchmark::kMillisecond)->UseRealTime();
 
 } // namespace
 

@@ -5,9 +5,11 @@
 #include "mccommon/numtext.h"
 #include "mccommon/variables.h"
 #include "simulation_common/spcsettings.h"
+#include "simulation_evaluation/secsettings.h"
 
 #include <algorithm>
 #include <cmath>
+#include <unordered_map>
 
 namespace MCHost {
 
@@ -47,6 +49,31 @@ void AddSkipped(const MCMCSP_800::SECContinuousTargetInfo& info,
         if (k < info.fvVarianceSkipped.size()) {
             measures[k].fVarianceSkipped = info.fvVarianceSkipped[k];
         }
+    }
+}
+
+//! The first-order index of every simulated input: a covariate's on its row, each other input
+//! (a categorical one) on a row of its own after them.
+void AddFirstOrder(const MCMCSP_800::SECContinuousTargetInfo& info,
+                   const std::vector<std::string>& predictors,
+                   std::vector<ReportInputMeasures>& measures) {
+    if (info.fvFirstOrder.empty()) {
+        return;
+    }
+    std::unordered_map<std::string, std::size_t> row;
+    for (std::size_t k = 0; k < measures.size(); ++k) {
+        row.emplace(measures[k].fInput, k);
+    }
+    for (std::size_t i = 0; i < predictors.size() && i < info.fvFirstOrder.size(); ++i) {
+        const auto it = row.find(predictors[i]);
+        if (it != row.end()) {
+            measures[it->second].fFirstOrder = info.fvFirstOrder[i];
+            continue;
+        }
+        ReportInputMeasures m{predictors[i], MCMV::Missing(), MCMV::Missing(), MCMV::Missing(),
+                              MCMV::Missing()};
+        m.fFirstOrder = info.fvFirstOrder[i];
+        measures.push_back(std::move(m));
     }
 }
 
@@ -117,9 +144,21 @@ ReportContinuousTarget BuildContinuous(const MCMCSP_800::SECContinuousTargetInfo
     target.fCiUpper = info.fCiUpper;
     target.fMinimum = info.fMinimum;
     target.fMaximum = info.fMaximum;
-    for (double p : percentiles) {
-        target.fvPercentiles.push_back(ReportPercentile{
-            p, HistogramPercentile(info.fHistogram, p, info.fMinimum, info.fMaximum)});
+    const MCMCSP_800::SECQuantileSummary& summary = info.fQuantiles;
+    if (summary.GetCount() > 0) {
+        target.fPercentileMethod = summary.IsExact() ? "exact" : "summary";
+        const double level = stats.GetSECSettings()->GetCiLevel();
+        for (double p : percentiles) {
+            ReportPercentile entry{p, summary.Quantile(p / 100.0)};
+            summary.QuantileInterval(p / 100.0, level, entry.fLower, entry.fUpper);
+            target.fvPercentiles.push_back(entry);
+        }
+    } else {
+        target.fPercentileMethod = "histogram";
+        for (double p : percentiles) {
+            target.fvPercentiles.push_back(ReportPercentile{
+                p, HistogramPercentile(info.fHistogram, p, info.fMinimum, info.fMaximum)});
+        }
     }
     target.fBinWidth = info.fHistogram.GetBinWidth();
     target.fvBins = HistogramBins(info.fHistogram);
@@ -127,6 +166,7 @@ ReportContinuousTarget BuildContinuous(const MCMCSP_800::SECContinuousTargetInfo
         InputMeasures(stats.GetCovariateNames(), info.fvPearsonCorrs, info.fvNegativeDelta,
                       info.fvPositiveDelta, info.fvVarianceContrib);
     AddSkipped(info, target.fvInputs);
+    AddFirstOrder(info, stats.GetPredictorNames(), target.fvInputs);
     return target;
 }
 

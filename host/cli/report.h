@@ -2,9 +2,11 @@
 // sensitivity iteration) turned into plain values that the text report (reporttext.cpp) and
 // the JSON document (reportjson.h) both render, so the two always say the same thing.
 //
-// Percentiles are read from the target's histogram accumulator (1000 equal bins over the chart
-// range plus outlier bins of the same width beyond it), so they are approximate: exact to
-// within one bin width.
+// Percentiles are the target's order statistics, read from its quantile summary (exact up to
+// 131,072 cases, within a rank error of 1e-4 past that), each with its distribution-free
+// confidence interval. Results without a summary (the host-driven way) fall back to the
+// histogram accumulator (1000 equal bins over the chart range plus outlier bins of the same
+// width beyond it), exact to within one bin width.
 #pragma once
 
 #include "simulation_common/mcsphistogramdata.h"
@@ -60,6 +62,9 @@ struct ReportInputMeasures {
     double fDeltaNegative; //!< mean change of the target, input − δ (tornado)
     double fDeltaPositive; //!< mean change of the target, input + δ (tornado)
     double fVarianceShare; //!< contribution of the input to the target's variance
+    //! First-order index Var(E[target | input]) / Var(target) from the run's cases; missing
+    //! when not computed. Categorical inputs have this measure only.
+    double fFirstOrder = MCCommon_800::MCMV::Missing();
     //! Accepted cases left out of the tornado (either side) and of the variance share: a
     //! shifted input outside its range, a variant the model could not score; −1 when the
     //! measure is off.
@@ -69,7 +74,9 @@ struct ReportInputMeasures {
 
 struct ReportPercentile {
     double fPercent; //!< 0 to 100
-    double fValue;   //!< approximate percentile
+    double fValue;   //!< the percentile
+    double fLower = MCCommon_800::MCMV::Missing(); //!< its CI's lower end; missing if none
+    double fUpper = MCCommon_800::MCMV::Missing(); //!< its CI's upper end; missing if none
 };
 
 struct ReportContinuousTarget {
@@ -80,7 +87,10 @@ struct ReportContinuousTarget {
     double fCiUpper;                             //!< upper end of the mean's CI
     double fMinimum;                             //!< smallest value
     double fMaximum;                             //!< largest value
-    std::vector<ReportPercentile> fvPercentiles; //!< from the histogram
+    std::vector<ReportPercentile> fvPercentiles; //!< the requested percentiles
+    //! How the percentiles were obtained: "exact" order statistics, a "summary" (rank error
+    //! at most 1e-4) or the "histogram" (within a bin width).
+    std::string fPercentileMethod;
     double fBinWidth;                            //!< the histogram's bin width
     std::vector<HistogramBin> fvBins;            //!< the histogram's non-empty bins
     std::vector<ReportInputMeasures> fvInputs;   //!< per covariate
@@ -166,8 +176,8 @@ struct SimulationReport {
     std::string fFirstModelError;              //!< the first of those messages
 };
 
-//! The report of one iteration's results; `percentiles` (0 to 100) are read from each
-//! continuous target's histogram.
+//! The report of one iteration's results; `percentiles` (0 to 100) of each continuous target
+//! with their intervals at the run's confidence level.
 ReportIteration BuildReportIteration(const MCMCSP_800::SECOutputStats& stats, int index,
                                      const std::vector<double>& percentiles);
 

@@ -26,6 +26,7 @@ Json InputMeasures(const std::vector<ReportInputMeasures>& inputs, bool continuo
         entry["input"] = m.fInput;
         entry["correlation"] = Number(m.fCorrelation);
         if (continuous) {
+            entry["first_order"] = Number(m.fFirstOrder);
             entry["delta_negative"] = Number(m.fDeltaNegative);
             entry["delta_positive"] = Number(m.fDeltaPositive);
             entry["variance_contribution"] = Number(m.fVarianceShare);
@@ -50,9 +51,13 @@ Json Continuous(const ReportContinuousTarget& t, double ciLevel) {
     target["max"] = Number(t.fMaximum);
     Json percentiles = Json::array();
     for (const ReportPercentile& p : t.fvPercentiles) {
-        percentiles.push_back(Json{{"percent", p.fPercent}, {"value", Number(p.fValue)}});
+        percentiles.push_back(Json{{"percent", p.fPercent},
+                                   {"value", Number(p.fValue)},
+                                   {"ci_lower", Number(p.fLower)},
+                                   {"ci_upper", Number(p.fUpper)}});
     }
     target["percentiles"] = std::move(percentiles);
+    target["percentile_method"] = t.fPercentileMethod;
     Json bins = Json::array();
     for (const HistogramBin& b : t.fvBins) {
         bins.push_back(Json{{"lower", Number(b.fLower)},

@@ -103,6 +103,9 @@ void WriteInputMeasures(std::ostream& out, const std::vector<ReportInputMeasures
     }
     const bool delta = continuous && !MCMV::IsMissing(report.fTornadoDelta);
     const bool variance = continuous && report.fbVariance;
+    const bool firstOrder =
+        std::any_of(inputs.begin(), inputs.end(),
+                    [](const ReportInputMeasures& m) { return !MCMV::IsMissing(m.fFirstOrder); });
     const std::string d = Num(report.fTornadoDelta);
     std::vector<std::vector<std::string>> rows;
     std::vector<std::string> header{"input", "correlation"};
@@ -113,15 +116,24 @@ void WriteInputMeasures(std::ostream& out, const std::vector<ReportInputMeasures
     if (variance) {
         header.push_back("variance share");
     }
+    if (firstOrder) {
+        header.push_back("first-order index");
+    }
     rows.push_back(header);
     for (const ReportInputMeasures& m : inputs) {
-        std::vector<std::string> row{m.fInput, Fixed(m.fCorrelation, 3)};
+        const auto figure = [](double x, int digits) {
+            return MCMV::IsMissing(x) ? std::string("-") : Fixed(x, digits);
+        };
+        std::vector<std::string> row{m.fInput, figure(m.fCorrelation, 3)};
         if (delta) {
             row.push_back(MCMV::IsMissing(m.fDeltaNegative) ? "-" : Num(m.fDeltaNegative));
             row.push_back(MCMV::IsMissing(m.fDeltaPositive) ? "-" : Num(m.fDeltaPositive));
         }
         if (variance) {
             row.push_back(MCMV::IsMissing(m.fVarianceShare) ? "-" : Fixed(m.fVarianceShare, 3));
+        }
+        if (firstOrder) {
+            row.push_back(figure(m.fFirstOrder, 3));
         }
         rows.push_back(std::move(row));
     }
@@ -161,13 +173,26 @@ void WriteContinuous(std::ostream& out, const ReportContinuousTarget& t,
         }
     }
     WriteTable(out, "  ", rows);
-    if (!t.fvPercentiles.empty()) {
+    if (!t.fvPercentiles.empty() && t.fPercentileMethod == "histogram") {
         out << "  percentiles (read from the histogram, exact to within " << Num(t.fBinWidth)
             << ")\n   ";
         for (const ReportPercentile& p : t.fvPercentiles) {
             out << "  " << MCCommon_800::FormatDefault(p.fPercent) << "%: " << Num(p.fValue);
         }
         out << "\n";
+    } else if (!t.fvPercentiles.empty()) {
+        out << "  percentiles ("
+            << (t.fPercentileMethod == "exact" ? "exact order statistics"
+                                               : "from a summary, rank error at most 0.0001")
+            << "; " << PercentText(report.fCiLevel)
+            << " distribution-free interval, - where the cases cannot give an end)\n";
+        std::vector<std::vector<std::string>> prows;
+        for (const ReportPercentile& p : t.fvPercentiles) {
+            const auto end = [](double x) { return MCMV::IsMissing(x) ? std::string("-") : Num(x); };
+            prows.push_back({MCCommon_800::FormatDefault(p.fPercent) + "%", Num(p.fValue),
+                             end(p.fLower) + " to " + end(p.fUpper)});
+        }
+        WriteTable(out, "    ", prows);
     }
     WriteHistogram(out, t);
     WriteInputMeasures(out, t.fvInputs, report, true);

@@ -282,6 +282,9 @@ void FillSettings(const SimulateOptions& options, MCThread_800::IMCThreadFactory
         settings.SetTornadoDeltaStddev(options.fTornadoDelta);
     }
     settings.SetTornadoVariance(options.fbVariance);
+    // Percentiles that hold in the tails and a first-order index of every input, from the
+    // run's own cases.
+    settings.SetQuantilesAndIndices(true);
 }
 
 //! Problems with the options that CLI11's checks do not see, and output files that would

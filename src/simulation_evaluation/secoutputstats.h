@@ -22,6 +22,7 @@
 #include "mcmath/mcsymmatrix.h"
 #include "simulation_common/mcsphistogramdata.h"
 #include "simulation_common/mcspscatterplotdata.h"
+#include "simulation_evaluation/secquantiles.h"
 
 #include <cstdint>
 #include <memory>
@@ -67,6 +68,13 @@ struct SECContinuousTargetInfo {
     //! score, no further case. The evaluations used are the counts of the statistics above.
     std::vector<std::int64_t> fvDeltaSkipped;
     std::vector<std::int64_t> fvVarianceSkipped; //!< the same for the variance measure
+    //! The valid values' percentiles (SECSettings::QuantilesAndIndices; empty otherwise).
+    SECQuantileSummary fQuantiles;
+    //! First-order sensitivity index S1 = Var(E[target | input]) / Var(target) of each
+    //! simulated input, in predictor order (SECOutputStats::GetPredictorNames), from the
+    //! run's cases (SECSettings::QuantilesAndIndices; empty otherwise, missing where it cannot
+    //! be estimated, and in the host-driven way, which knows no normal scores).
+    std::vector<double> fvFirstOrder;
 
     //! Diagnostic print through the display stream.
     void Display() const;

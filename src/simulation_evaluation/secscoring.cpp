@@ -514,31 +514,7 @@ bool SECSimulator::AreTargetsAccepted(const std::vector<double>& values) const {
 }
 
 MCStatus SECSimulator::DrawAndScoreCase() {
-    fLastRejections = 0;
-    for (int attempt = 0; attempt < SECGenerationConst::kMaxAttempts; ++attempt) {
-        MCStatus status = GenerateAttempt();
-        if (status.IsError()) {
-            return status;
-        }
-        // Inputs are checked before the case is scored: a case outside its truncation bounds is
-        // rejected whatever its score.
-        if (!AreInputsWithinBounds()) {
-            ++fLastRejections;
-            continue;
-        }
-        if (fpScoreComputer) {
-            status = ScoreInputs(fvCaseValues);
-            if (status.IsError()) {
-                return status;
-            }
-            if (!AreTargetsAccepted(fvScoreValues)) {
-                ++fLastRejections;
-                continue;
-            }
-        }
-        return MCStatus();
-    }
-    return MCStatus(MCSPStatus::kAttemptsExhausted, false);
+    return DrawAcceptedCase(true);
 }
 
 // ---- Chart ranges -----------------------------------------------------------------------------
@@ -654,6 +630,7 @@ void SECSimulator::CreateChartAccumulators() {
         }
     }
     fbChartsReady = true;
+    PrepareAddedResults();
 }
 
 MCStatus SECSimulator::RunPilot() {
@@ -687,6 +664,9 @@ void SECSimulator::AccumulateCase() {
         AccumulateSensitivity();
     }
     AccumulateValues(fvCaseValues, fvScoreValues, fCrosstabCell, fLastRejections);
+    if (fbAddedResults) {
+        AccumulateAddedResults(fvCaseValues, fvScoreValues, true);
+    }
 }
 
 void SECSimulator::AccumulateValues(const std::vector<double>& inputs,
@@ -840,6 +820,9 @@ MCStatus SECSimulator::UpdateStatsForRecord(const std::vector<double>& predictor
         ++fFilteredCaseCount;
     } else {
         AccumulateValues(predictors, targets, fCrosstabCell, fLastRejections);
+        if (fbAddedResults) {
+            AccumulateAddedResults(predictors, targets, false);
+        }
     }
     return MCStatus();
 }
@@ -951,7 +934,8 @@ SECSimulator::MergeStatsFromThreads(const std::vector<std::unique_ptr<SECSimulat
         const std::vector<SECContinuousTargetInfo>& wCont = w.GetContTargetInfo();
         const std::vector<SECCategoricalTargetInfo>& wCat = w.GetCateTargetInfo();
         if (wCovar.size() != covarStats.size() || wCont.size() != cont.size() ||
-            wCat.size() != cat.size() || !fProvMeans.Merge(worker->fProvMeans)) {
+            wCat.size() != cat.size() || !fProvMeans.Merge(worker->fProvMeans) ||
+            (fbAddedResults && !fFirstOrder.Merge(worker->fFirstOrder))) {
             status = MCStatus(MCSPStatus::kMergeFailed, false);
             continue;
         }
@@ -963,6 +947,7 @@ SECSimulator::MergeStatsFromThreads(const std::vector<std::unique_ptr<SECSimulat
             SECContinuousTargetInfo& to = cont[t];
             const SECContinuousTargetInfo& from = wCont[t];
             to.fContStats.Pool(from.fContStats);
+            to.fQuantiles.Merge(from.fQuantiles);
             const auto pool = [](std::vector<MCContStats>& a, const std::vector<MCContStats>& b) {
                 for (std::size_t k = 0; k < a.size() && k < b.size(); ++k) {
                     a[k].Pool(b[k]);
@@ -1099,6 +1084,7 @@ MCStatus SECSimulator::CompleteStats() {
         }
     }
     CompleteSensitivity();
+    CompleteAddedResults();
 
     // Simulated correlations of the covariates, at their places in the plan's correlation
     // variable order when the plan has one.

@@ -232,3 +232,84 @@ void SECSimulator::CompleteSensitivity() {
 }
 
 } // namespace MCMCSP_800
+
+namespace MCMCSP_800 {
+
+namespace {
+//! A discrete input with at most this many values gets a bin per value.
+constexpr std::size_t kFirstOrderValueBins = 64;
+} // namespace
+
+void SECSimulator::PrepareAddedResults() {
+    fbAddedResults = fpSettings->QuantilesAndIndices();
+    if (!fbAddedResults) {
+        return;
+    }
+    std::vector<int> bins(fvSimInputs.size(), SECFirstOrderIndices::kNormalScoreBins);
+    fvFirstOrderValues.assign(fvSimInputs.size(), {});
+    for (std::size_t i = 0; i < fvSimInputs.size(); ++i) {
+        const SimInput& input = fvSimInputs[i];
+        const auto group = static_cast<std::size_t>(input.fGroupIndex);
+        if (input.fbCategorical) {
+            bins[i] = static_cast<int>(fvCategorical[group].fSampler.fvCategoryText.size());
+            continue;
+        }
+        std::vector<double> cdf;
+        if (SECDiscreteSupport(fvCorrelated[group].fGenerator, kFirstOrderValueBins,
+                               fvFirstOrderValues[i], cdf)) {
+            bins[i] = static_cast<int>(fvFirstOrderValues[i].size());
+        }
+    }
+    fFirstOrder.Reset(bins, fvContCentre);
+    fvFirstOrderBin.assign(fvSimInputs.size(), -1);
+    fvFirstOrderY.assign(fvContTargetPos.size(), 0.0);
+    for (SECContinuousTargetInfo& info : fpOutputStats->GetContTargetInfo()) {
+        info.fQuantiles = SECQuantileSummary();
+    }
+}
+
+void SECSimulator::AccumulateAddedResults(const std::vector<double>& inputs,
+                                          const std::vector<double>& values, bool withScores) {
+    std::vector<SECContinuousTargetInfo>& cont = *fpContInfo;
+    for (std::size_t t = 0; t < fvContTargetPos.size(); ++t) {
+        fvFirstOrderY[t] = values[static_cast<std::size_t>(fvContTargetPos[t])];
+        cont[t].fQuantiles.Add(fvFirstOrderY[t]);
+    }
+    if (!withScores) {
+        return;
+    }
+    for (std::size_t i = 0; i < fvSimInputs.size(); ++i) {
+        const SimInput& input = fvSimInputs[i];
+        const double x = inputs[i];
+        int bin = -1;
+        if (input.fbCategorical) {
+            const std::size_t nCats = fvCategorical[static_cast<std::size_t>(input.fGroupIndex)]
+                                          .fSampler.fvCategoryText.size();
+            bin = x >= 0.0 && x < static_cast<double>(nCats) ? static_cast<int>(x) : -1;
+        } else if (!fvFirstOrderValues[i].empty()) {
+            const std::vector<double>& support = fvFirstOrderValues[i];
+            const auto it = std::lower_bound(support.begin(), support.end(), x);
+            bin = it != support.end() && *it == x ? static_cast<int>(it - support.begin()) : -1;
+        } else {
+            bin = SECFirstOrderIndices::NormalScoreBin(fvZ[static_cast<std::size_t>(input.fGroupIndex)]);
+        }
+        fvFirstOrderBin[i] = bin;
+    }
+    fFirstOrder.Add(fvFirstOrderBin.data(), fvFirstOrderY.data());
+}
+
+void SECSimulator::CompleteAddedResults() {
+    if (!fbAddedResults) {
+        return;
+    }
+    std::vector<SECContinuousTargetInfo>& cont = fpOutputStats->GetContTargetInfo();
+    for (std::size_t t = 0; t < cont.size(); ++t) {
+        SECContinuousTargetInfo& info = cont[t];
+        info.fvFirstOrder.assign(fvSimInputs.size(), MCMV::Missing());
+        for (std::size_t i = 0; i < fvSimInputs.size(); ++i) {
+            info.fvFirstOrder[i] = fFirstOrder.Index(i, t, info.fContStats.GetSumSqDev());
+        }
+    }
+}
+
+} // namespace MCMCSP_800

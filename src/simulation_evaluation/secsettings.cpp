@@ -79,6 +79,7 @@ void SECSettings::Display(std::ostream& os) const {
     DisplayB("Use tornado delta of the mean:", fbUseTornadoDeltaMean);
     DisplayD("Tornado delta of the mean:", fTornadoDeltaMean);
     DisplayB("Tornado contribution to variance:", fbTornadoVariance);
+    DisplayB("Quantile summaries and first-order indices:", fbQuantilesAndIndices);
     DisplayB("Tornado all charts:", fbTornadoAllCharts);
     DisplayWord("Ordinal correlation", GetOrdinalCorrelationsDisplayWord(fOrdCorrelation));
 

@@ -150,6 +150,12 @@ public:
     //! Compute each input's contribution to the variance of each continuous target.
     bool TornadoVariance() const { return fbTornadoVariance; }
     void SetTornadoVariance(bool on) { fbTornadoVariance = on; }
+    //! Added results of every continuous target, off by default: a quantile summary whose
+    //! percentiles hold in the tails (SECContinuousTargetInfo::fQuantiles) and the first-order
+    //! sensitivity index of every simulated input from the run's own cases
+    //! (SECContinuousTargetInfo::fvFirstOrder).
+    bool QuantilesAndIndices() const { return fbQuantilesAndIndices; }
+    void SetQuantilesAndIndices(bool on) { fbQuantilesAndIndices = on; }
     bool TornadoAllCharts() const { return fbTornadoAllCharts; }
     void SetTornadoAllCharts(bool on) { fbTornadoAllCharts = on; }
     MCSPConst::OrdinalCorrelations GetOrdCorrelation() const { return fOrdCorrelation; }
@@ -276,6 +282,7 @@ private:
     bool fbUseTornadoDeltaMean = false; //!< a delta of the mean is set
     double fTornadoDeltaMean = 0.0;     //!< that delta
     bool fbTornadoVariance = false;     //!< compute contribution to variance
+    bool fbQuantilesAndIndices = false; //!< quantile summaries and first-order indices
     bool fbTornadoAllCharts = false;    //!< show all tornado charts
     MCSPConst::OrdinalCorrelations fOrdCorrelation = MCSPConst::kCorrPearson; //!< ordinal measure
 

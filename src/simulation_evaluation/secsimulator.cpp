@@ -640,16 +640,33 @@ bool SECSimulator::AreInputsWithinBounds() const {
 }
 
 MCStatus SECSimulator::DrawCase() {
+    return DrawAcceptedCase(false);
+}
+
+MCStatus SECSimulator::DrawAcceptedCase(bool score) {
     fLastRejections = 0;
     for (int attempt = 0; attempt < SECGenerationConst::kMaxAttempts; ++attempt) {
-        const MCStatus status = GenerateAttempt();
+        MCStatus status = GenerateAttempt();
         if (status.IsError()) {
             return status;
         }
-        if (AreInputsWithinBounds()) {
-            return status;
+        // Inputs are checked before the case is scored: a case outside its truncation bounds is
+        // rejected whatever its score.
+        if (!AreInputsWithinBounds()) {
+            ++fLastRejections;
+            continue;
         }
-        ++fLastRejections;
+        if (score && fpScoreComputer) {
+            status = ScoreInputs(fvCaseValues);
+            if (status.IsError()) {
+                return status;
+            }
+            if (!AreTargetsAccepted(fvScoreValues)) {
+                ++fLastRejections;
+                continue;
+            }
+        }
+        return MCStatus();
     }
     return MCStatus(MCSPStatus::kAttemptsExhausted, false);
 }

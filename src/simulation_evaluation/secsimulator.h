@@ -49,6 +49,7 @@
 #include "mcmath/mcsymmatrix.h"
 #include "mcthread/mcthread.h"
 #include "simulation_common/spcsettings.h"
+#include "simulation_evaluation/secfirstorder.h"
 #include "simulation_evaluation/secgeneration.h"
 #include "simulation_evaluation/secnorta.h"
 #include "simulation_evaluation/secoutputstats.h"
@@ -164,6 +165,10 @@ public:
     //! A case with truncation by rejection on the inputs: up to 1000 attempts, code 390014
     //! when all are rejected. GetLastRejections tells how many attempts were rejected.
     MCCommon_800::MCStatus DrawCase();
+    //! The one retry loop of truncation by rejection: attempts until the inputs lie inside
+    //! their bounds and, with `score` and a score computer, the scored targets pass their
+    //! filters; up to 1000 attempts, then code 390014. GetLastRejections counts the rejected.
+    MCCommon_800::MCStatus DrawAcceptedCase(bool score);
     //! The host-driven draw: DrawCase into `values`, which is sized to the number of simulated
     //! inputs (filled with 0.0) when its size differs; missing values on failure.
     MCCommon_800::MCStatus SimulatePredictors(std::vector<double>& values);
@@ -453,6 +458,15 @@ private:
     //! Positive and negative deltas and variance contributions of every continuous target.
     void CompleteSensitivity();
     bool UsesSensitivity() const { return fbDeltaMeasure || fbVarianceMeasure; }
+    //! Sizes the quantile summaries and first-order accumulator (SECSettings::
+    //! QuantilesAndIndices) once the centres of the continuous targets are known.
+    void PrepareAddedResults();
+    //! Adds the accepted case to the quantile summaries and, with its normal scores
+    //! (`withScores`), to the first-order accumulator.
+    void AccumulateAddedResults(const std::vector<double>& inputs, const std::vector<double>& values,
+                                bool withScores);
+    //! The first-order indices of every continuous target.
+    void CompleteAddedResults();
 
     //! The thread task of a NORTA worker.
     MCCommon_800::MCStatus RunNortaPairs();
@@ -573,6 +587,15 @@ private:
     //! Centre of each continuous target's products in the variance measure: its pilot (or
     //! start-up) mean, 0 until one is known.
     std::vector<double> fvContCentre;
+
+    // Added results (SECSettings::QuantilesAndIndices).
+    bool fbAddedResults = false;        //!< quantile summaries and first-order indices on
+    SECFirstOrderIndices fFirstOrder;   //!< bins of every simulated input × continuous target
+    //! Per simulated input: its values when it is discrete with few of them (a bin each);
+    //! empty for the other inputs.
+    std::vector<std::vector<double>> fvFirstOrderValues;
+    std::vector<int> fvFirstOrderBin;      //!< the case's bin of each simulated input
+    std::vector<double> fvFirstOrderY;     //!< the case's continuous targets
 
     MCCommon_800::MCStatus fStatus;     //!< outcome of the last task or preparation
     MCCommon_800::MCWarnings fWarnings; //!< warnings (390015)

@@ -137,7 +137,11 @@ TEST(McsimSimulate, ExamplePlanMatchesClosedForm) {
         const double exact = boost::math::quantile(normal, q);
         const double se = std::sqrt(q * (1 - q) / n) / boost::math::pdf(normal, exact);
         EXPECT_NEAR_TOL(p.at("value").get<double>(), exact, 0.0, 5.0 * se + binWidth) << q;
+        // Order statistics of the cases, inside their distribution-free interval.
+        EXPECT_LE(p.at("ci_lower").get<double>(), p.at("value").get<double>());
+        EXPECT_GE(p.at("ci_upper").get<double>(), p.at("value").get<double>());
     }
+    EXPECT_EQ(margin->at("percentile_method"), "exact");
     double binned = 0.0;
     for (const Json& b : margin->at("histogram").at("bins")) {
         binned += b.at("count").get<double>();
@@ -207,7 +211,10 @@ TEST(McsimSimulate, TornadoDeltasMatchTheModel) {
     for (const Json& m : profit->at("sensitivity")) {
         byInput[m.at("input").get<std::string>()] = m;
     }
-    ASSERT_EQ(byInput.size(), 2u);
+    // The categorical region has a first-order index only.
+    ASSERT_EQ(byInput.size(), 3u);
+    EXPECT_TRUE(byInput["region"].at("delta_positive").is_null());
+    EXPECT_GE(byInput["region"].at("first_order").get<double>(), 0.0);
     const double sdUnits = std::sqrt(390000.0 / 18.0);
     EXPECT_NEAR_TOL(byInput["price"].at("delta_positive").get<double>(), 2200.0, 0.0,
                     5.0 * 2.0 * sdUnits / std::sqrt(20000.0));

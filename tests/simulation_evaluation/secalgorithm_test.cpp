@@ -40,6 +40,7 @@ struct LinearRun {
     scorers::ScoreCounter counter;
     std::unique_ptr<SECAlgorithm> alg;
 
+    //! The reference plan; or `inputs` in place of x0 and x1.
     LinearRun(int nThreads, std::uint32_t seed, int cases) {
         tp.settings.SetThreadFactory(&threads);
         tp.settings.SetMaxThreadNum(nThreads);
@@ -47,6 +48,20 @@ struct LinearRun {
         tp.plan.SetMaxCases(cases);
         tp.AddInput("x0", simgen::MakeDist(kDistNormal, {{"mean", 10.0}, {"stddev", 2.0}}));
         tp.AddInput("x1", simgen::MakeDist(kDistUniform, {{"min", 0.0}, {"max", 4.0}}));
+        AddRegionAndTarget();
+    }
+    LinearRun(int nThreads, std::uint32_t seed, int cases,
+              const std::vector<std::pair<std::string, std::vector<DistInfoElem>>>& inputs) {
+        tp.settings.SetThreadFactory(&threads);
+        tp.settings.SetMaxThreadNum(nThreads);
+        tp.settings.SetSeed(seed);
+        tp.plan.SetMaxCases(cases);
+        for (const auto& input : inputs) {
+            tp.AddInput(input.first, input.second);
+        }
+        AddRegionAndTarget();
+    }
+    void AddRegionAndTarget() {
         tp.AddInput("region", simgen::MakeCategorical({"north", "south", "west"}, {0.5, 0.3, 0.2}),
                     kLevelCategorical);
         SPCSettings::ModelFileTarget target;
@@ -244,6 +259,7 @@ TEST(LinearModel, SensitivityMeasuresNeverChangeTheBaseRun) {
         LinearRun on(threads, 23u, 20000);
         on.tp.settings.SetTornadoDeltaStddev(1.5);
         on.tp.settings.SetTornadoVariance(true);
+        on.tp.settings.SetQuantilesAndIndices(true);
         auto failing = scorers::MakeFactory([]() -> std::unique_ptr<IMCScoreComputer> {
             return std::make_unique<scorers::FailingScorer>(
                 std::vector<LinearTarget>{LinearRun::Model()}, 0.1, -1);
@@ -263,6 +279,7 @@ TEST(LinearModel, SensitivityMeasuresNeverChangeTheBaseRun) {
         EXPECT_EQ(off.Results().GetSimulCorr().GetElem(1, 0),
                   on.Results().GetSimulCorr().GetElem(1, 0));
         EXPECT_GT(b.fvDeltaSkipped[1], 0);
+        EXPECT_EQ(b.fQuantiles.GetCount(), on.Results().GetValidCaseCount());
     }
 }
 
@@ -760,4 +777,31 @@ TEST(LinearModel, VarianceContributionDoesNotMoveWithTheTargetsLocation) {
     // V = Var(a + 2b) = 1 + 4 + 4·0.6 = 7.4. The further case's a' is independent of the case,
     // so Cov(Y, a' + 2b) = 2·0.6 + 4 = 5.2 and a's share is (7.4 − 5.2)/7.4.
     EXPECT_NEAR(t[0].fvVarianceContrib[0], 2.2 / 7.4, 0.03);
+}
+
+TEST(AddedResults, FirstOrderIndicesMatchTheClosedForms) {
+    // t = 1 + 2·x0 − 3·e + 1.5·l + effect(region), independent inputs: x0 ~ Normal(10, 2),
+    // e ~ Exponential(rate 0.5), l ~ LogNormal(a = 1, b = 1) (variance e·(e − 1)) and the
+    // region effect of variance 8.49. S1 of an input is its term's share of Var(t).
+    LinearRun run(2, 31u, 1000000,
+                  {{"x0", {simgen::MakeDist(kDistNormal, {{"mean", 10.0}, {"stddev", 2.0}})}},
+                   {"e", {simgen::MakeDist(kDistExponential, {{"scale", 0.5}})}},
+                   {"l", {simgen::MakeDist(kDistLognormal, {{"a", 1.0}, {"b", 1.0}})}}});
+    run.tp.settings.SetQuantilesAndIndices(true);
+    LinearTarget model = LinearRun::Model();
+    model.fvCoefs = {{"x0", 2.0}, {"e", -3.0}, {"l", 1.5}};
+    auto factory = scorers::MakeFactory([&model]() -> std::unique_ptr<IMCScoreComputer> {
+        return std::make_unique<scorers::LinearScorer>(std::vector<LinearTarget>{model},
+                                                       IMCScoreComputer::kRegression, nullptr);
+    });
+    ASSERT_TRUE(run.Run(&factory).IsOK());
+    const double terms[] = {4.0 * 4.0, 9.0 * 4.0, 2.25 * std::exp(1.0) * (std::exp(1.0) - 1.0),
+                            8.49};
+    const double total = terms[0] + terms[1] + terms[2] + terms[3];
+    const std::vector<double>& s1 = run.Target().fvFirstOrder;
+    ASSERT_EQ(s1.size(), 4u);
+    for (std::size_t k = 0; k < 4; ++k) {
+        EXPECT_NEAR(s1[k], terms[k] / total, 0.01) << run.Results().GetPredictorNames()[k];
+    }
+    EXPECT_EQ(run.Target().fQuantiles.GetCount(), run.Results().GetValidCaseCount());
 }
