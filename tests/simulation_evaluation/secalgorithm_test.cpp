@@ -260,6 +260,7 @@ TEST(LinearModel, SensitivityMeasuresNeverChangeTheBaseRun) {
         on.tp.settings.SetTornadoDeltaStddev(1.5);
         on.tp.settings.SetTornadoVariance(true);
         on.tp.settings.SetQuantilesAndIndices(true);
+        off.tp.settings.SetQuantilesAndIndices(true);
         auto failing = scorers::MakeFactory([]() -> std::unique_ptr<IMCScoreComputer> {
             return std::make_unique<scorers::FailingScorer>(
                 std::vector<LinearTarget>{LinearRun::Model()}, 0.1, -1);
@@ -280,6 +281,9 @@ TEST(LinearModel, SensitivityMeasuresNeverChangeTheBaseRun) {
                   on.Results().GetSimulCorr().GetElem(1, 0));
         EXPECT_GT(b.fvDeltaSkipped[1], 0);
         EXPECT_EQ(b.fQuantiles.GetCount(), on.Results().GetValidCaseCount());
+        for (const double q : {0.001, 0.5, 0.999}) {
+            EXPECT_EQ(a.fQuantiles.Quantile(q), b.fQuantiles.Quantile(q)) << q;
+        }
     }
 }
 
