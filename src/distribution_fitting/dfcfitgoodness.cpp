@@ -6,6 +6,7 @@
 
 #include "distribution_fitting/dfcaccumstats.h"
 #include "distribution_fitting/dfcalgorithm.h"
+#include "distribution_fitting/dfcfitdiagnostics.h"
 #include "mccommon/mcmv.h"
 #include "mcmath/mcdistfun.h"
 
@@ -432,6 +433,32 @@ void SetLikelihoodResults(DFCOutputStats::DFCVarDistElement& element, double log
     element.fAICc = ic.fAICc;
 }
 
+namespace {
+
+//! Standard errors and plot points of count candidate `element` from the weighted counts of
+//! its field (entry c: the weight of the value c) with total weight `totalWeight`.
+void AddCountDiagnostics(DFCOutputStats::DFCVarDistElement& element,
+                         const std::vector<double>& counts, double totalWeight) {
+    const DistType type = element.fDistType;
+    const auto logLik = [type, &counts](const std::vector<double>& p) {
+        return ComputeCountLogLikelihood(type, p, counts);
+    };
+    // The values with a positive count, ascending.
+    std::vector<double> values;
+    for (std::size_t c = 0; c < counts.size(); ++c) {
+        if (counts[c] > 0.0) {
+            values.push_back(static_cast<double>(c));
+        }
+    }
+    const DFCSortedSample sample{
+        values.size(), [&values](std::size_t i) { return values[i]; },
+        [&values, &counts](std::size_t i) { return counts[static_cast<std::size_t>(values[i])]; },
+        totalWeight};
+    SetFitDiagnostics(element, sample, logLik);
+}
+
+} // namespace
+
 MCStatus DFCAlgorithm::ComputeChiSquare() {
     const std::vector<DFCSettings::VarInfoElem>& covInfo = fSettings.GetCovariateInfoElems();
     for (int i = 0; i < fNCovariates; ++i) {
@@ -470,6 +497,7 @@ MCStatus DFCAlgorithm::ComputeChiSquare() {
             element.fChiSquarePooled = fit.fPooledStatistic;
             element.fChiSquarePooledDF = fit.fPooledDegreesOfFreedom;
             element.fChiSquarePooledPValue = fit.fPooledPValue;
+            AddCountDiagnostics(element, info.fCategoryCounts, fValidWeight);
             if (MCMV::IsMissing(fit.fPValue) || fit.fPValue < fPValueThreshold) {
                 DropCovarDist(i, type,
                               MCMV::IsMissing(fit.fPValue) ? kDropNoPValue : kDropBelowThreshold);
@@ -1634,6 +1662,40 @@ MCStatus DFCFitGoodnessTask::ComputeEdfStatistics() {
     fpElement->fADPValueUpper = sig.fADPUpper;
     fpElement->fKSPValueLower = sig.fKSPLower;
     fpElement->fKSPValueUpper = sig.fKSPUpper;
+    return AddDiagnostics();
+}
+
+MCStatus DFCFitGoodnessTask::AddDiagnostics() {
+    const std::vector<DFCGoodFitEntry>& entries = *fpEntries;
+    const auto weight = [this, &entries](std::size_t i) {
+        return fpWeights ? WeightOf(entries[i]) : 1.0;
+    };
+    const MCSPDistFamily* family = MCSPFindDistFamily(fDistType);
+    // Σ w·ln f(x) at other parameters, for the observed information; a cancel request ends
+    // the sum with a missing value.
+    const auto logLik = [&](const std::vector<double>& p) {
+        if (!family || PollCancel()) {
+            return kMissing;
+        }
+        long double sum = 0.0L;
+        double lastX = kMissing;
+        double lnF = 0.0;
+        for (std::size_t i = 0; i < fNEntries; ++i) {
+            const double x = entries[i].fValue;
+            if (i == 0 || x != lastX) {
+                lnF = family->fLogDensity(p.data(), x);
+                lastX = x;
+            }
+            sum += static_cast<long double>(weight(i)) * lnF;
+        }
+        return static_cast<double>(sum);
+    };
+    const DFCSortedSample sample{fNEntries, [&entries](std::size_t i) { return entries[i].fValue; },
+                                 weight, fTotalWeight};
+    SetFitDiagnostics(*fpElement, sample, logLik);
+    if (fbCancelled) {
+        return MCStatus(MCSPStatus::kCancelled, false);
+    }
     return MCStatus();
 }
 

@@ -227,6 +227,8 @@ public:
 private:
     //! u, A², D, Z*, D*, the p-values and ln L; the status of the computation.
     MCStatus ComputeEdfStatistics();
+    //! Standard errors and Q-Q and P-P points of the candidate (dfcfitdiagnostics.h).
+    MCStatus AddDiagnostics();
     //! The sorted entries [first, last) strictly inside the fitted support and their weight.
     void FindInterior(std::size_t& first, std::size_t& last, double& weight) const;
     //! The frequency weight of `entry` (weighted runs only).

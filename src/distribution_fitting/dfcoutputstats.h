@@ -87,6 +87,18 @@ public:
         double fAICc;                  //!< AIC + 2k(k + 1)/(W - k - 1); missing when W ≤ k + 1
         std::string fLogLikReason;     //!< why ln L (and AIC, BIC, AICc) is missing, or ""
         DFCDropReason fDropReason;     //!< why the candidate was dropped, kDropNone if it was not
+        // Standard errors from the observed information at the estimate (dfcfitdiagnostics.h):
+        // one per entry of fDistParams, missing for a parameter the fitting does not estimate
+        // by maximum likelihood at an interior point; fStdErrorReason says why any is missing.
+        std::vector<double> fvStdErrors;         //!< SE of each parameter, or empty
+        std::vector<double> fvParamCorrelations; //!< their correlations, row-major, or empty
+        std::string fStdErrorReason;             //!< why an SE is missing, or ""
+        // Q-Q and P-P points at the plotting positions p_i = i/100, i = 1 .. 99 (empty when the
+        // candidate was not evaluated).
+        std::vector<double> fvPlotSampleQuantiles; //!< x_i, the sample's p_i quantile
+        std::vector<double> fvPlotSampleProbs;     //!< F_n(x_i), the sample's EDF at x_i
+        std::vector<double> fvPlotFittedQuantiles; //!< F⁻¹(p_i) of the fitted distribution
+        std::vector<double> fvPlotFittedProbs;     //!< F(x_i) of the fitted distribution
 
         //! Diagnostic listing through the display stream.
         void Display() const;
