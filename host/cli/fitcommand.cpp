@@ -1,6 +1,8 @@
 #include "cli/fitcommand.h"
 
 #include "cli/commandline.h"
+#include "cli/fitjson.h"
+#include "cli/fitoptions.h"
 #include "cli/interrupt.h"
 #include "cli/progress.h"
 #include "cli/statustext.h"
@@ -135,6 +137,15 @@ std::string SeparatorAdvice(const CsvLayout& layout) {
            (other != ',' ? " (and --decimal-comma for numbers written 3,14)" : "");
 }
 
+//! "Normal, Gamma, ..." of `types`.
+std::string FamilyList(const std::vector<DistType>& types) {
+    std::string out;
+    for (DistType t : types) {
+        out += (out.empty() ? "" : ", ") + MCMCSP_800::DistType2String(t);
+    }
+    return out;
+}
+
 void AppendUnique(std::vector<std::string>& list, const std::string& name) {
     if (std::find(list.begin(), list.end(), name) == list.end()) {
         list.push_back(name);
@@ -171,6 +182,21 @@ std::vector<std::string> FieldsToFit(const FitOptions& options, const DataDictio
 void FillSettings(const FitOptions& options, const DataDictionary& dict,
                   const std::vector<std::string>& fields, MCThread_800::IMCThreadFactory& threads,
                   DFCSettings& settings) {
+    const FamilyFilter filter = ParseFamilyFilter(options.fvFamilies, options.fvExclude);
+    for (const std::string& name : FilterFieldNames(filter)) {
+        if (std::find(fields.begin(), fields.end(), name) == fields.end()) {
+            throw HostError("--families/--exclude name field '" + name +
+                            "', which is not among the fitted fields");
+        }
+    }
+    const auto candidates = [&](const std::string& name, const std::vector<DistType>& all) {
+        std::vector<DistType> kept = FilterCandidates(filter, name, all);
+        if (kept.empty()) {
+            throw HostError("--families/--exclude leave field '" + name +
+                            "' no candidate family (its level allows " + FamilyList(all) + ")");
+        }
+        return kept;
+    };
     for (const std::string& name : fields) {
         const int index = dict.FindField(name);
         const DataField& field = dict.GetFields()[static_cast<std::size_t>(index)];
@@ -188,10 +214,12 @@ void FillSettings(const FitOptions& options, const DataDictionary& dict,
             break;
         }
         case kLevelOrdinal:
-            added = settings.AddCovariate(index, kOrdinalCandidates, kLevelOrdinal, false);
+            added = settings.AddCovariate(index, candidates(name, kOrdinalCandidates),
+                                          kLevelOrdinal, false);
             break;
         default:
-            added = settings.AddCovariate(index, kContinuousCandidates, kLevelContinuous, false);
+            added = settings.AddCovariate(index, candidates(name, kContinuousCandidates),
+                                          kLevelContinuous, false);
             break;
         }
         if (added < 0) {
@@ -251,17 +279,6 @@ bool DistinctInSixDigits(const std::vector<double>& values) {
         }
     }
     return true;
-}
-
-//! The parameter names as the report shows them: the plan calls the Gamma's second parameter
-//! and the Exponential's parameter "scale", but both are rates (mean k/β and 1/θ).
-std::vector<std::string> ReportParamNames(DistType type, std::vector<std::string> names) {
-    if (type == kDistGamma && names.size() == 2) {
-        names[1] = "rate";
-    } else if (type == kDistExponential && names.size() == 1) {
-        names[0] = "rate";
-    }
-    return names;
 }
 
 //! "name = value, ..." in parameter-name order. Values beyond the names belong to the last
@@ -402,7 +419,7 @@ std::string BestPValueText(const DFCOutputStats::DFCVarDistInfo& info, GoodFitTy
 
 void PrintCovariate(std::ostream& out, const DFCOutputStats::DFCVarDistInfo& info,
                     const DFCSettings::VarInfoElem& allowed, const DataField& field,
-                    GoodFitType type) {
+                    GoodFitType type, const FitDecision& decision, FitRule order) {
     out << "\n" << info.fFittedVarName << "  (" << MeasureLevelName(info.fMeasureLevel);
     if (info.fMeasureLevel == kLevelOrdinal) {
         out << ", " << field.fvNumbers.size() << " distinct values";
@@ -422,13 +439,18 @@ void PrintCovariate(std::ostream& out, const DFCOutputStats::DFCVarDistInfo& inf
             out << ", p-value " << BestPValueText(info, type);
         }
         out << "\n";
+        out << "  chosen by  " << decision.fRule << ": " << decision.fWhy << "\n";
     } else {
         out << "  best fit   none in the results\n";
     }
 
     std::set<DistType> listed;
     if (!info.fReportedElements.empty()) {
-        out << "  ranked candidates\n";
+        out << "  ranked candidates";
+        if (order != FitRule::kComponent) {
+            out << " (by " << FitRuleName(order) << ")";
+        }
+        out << "\n";
         int rank = 0;
         for (const auto& e : info.fReportedElements) {
             listed.insert(e.fDistType);
@@ -690,8 +712,21 @@ void CheckFitOptions(const FitOptions& options) {
     }
     static_cast<void>(CollectLevels(options));
     static_cast<void>(ParseFixed(options.fvFixed));
+    static_cast<void>(ParseFamilyFilter(options.fvFamilies, options.fvExclude));
+    // A rule by an EDF statistic needs that statistic computed.
+    for (const auto& [option, text] : {std::pair<std::string, const std::string*>{"--choose",
+                                                                                 &options.fChoose},
+                                       {"--rank", &options.fRank}}) {
+        const FitRule rule = ParseFitRule(*text, option);
+        if ((rule == FitRule::kAD && options.fTest == "ks") ||
+            (rule == FitRule::kKS && options.fTest == "ad")) {
+            throw UsageError(option + " " + *text + " needs --test " + *text + " or --test both");
+        }
+    }
     CheckOutputFiles({{"data file", options.fDataPath}, {"model file", options.fModelPath}},
-                     {{"-o", options.fPlanPath}, {"--fit-stats", options.fFitStatsPath}});
+                     {{"-o", options.fPlanPath},
+                      {"--fit-stats", options.fFitStatsPath},
+                      {"--json", options.fJsonPath}});
 }
 
 //! Builds the data dictionary; a failure, or a header of one field, that looks like the wrong
@@ -722,16 +757,18 @@ DataDictionary ReadDictionary(const FitOptions& options, const CsvLayout& layout
     }
 }
 
-//! Writes the plan and the statistics document, both or neither. False, with nothing written,
-//! when an interrupt came before the files were put in place.
+//! Writes the plan (with the choices made in `chosen`), the statistics document (the
+//! component's `results` as they are) and the JSON text `json`, all or none. False, with
+//! nothing written, when an interrupt came before the files were put in place.
 bool WriteOutputs(const FitOptions& options, const DataDictionary& dict,
                   const std::vector<std::string>& fields, const DFCOutputStats& results,
+                  const DFCOutputStats& chosen, const std::string& json,
                   const FormulaModel* model, InterruptWatcher& interrupt, std::ostream& out,
                   std::ostream& err) {
     MCMCSP_800::MCPlanXMLHandler handler;
     std::string planXml;
     if (!options.fPlanPath.empty()) {
-        const SPCSettings plan = BuildPlan(options, dict, fields, results, model, err);
+        const SPCSettings plan = BuildPlan(options, dict, fields, chosen, model, err);
         if (!handler.WritePlanFile(planXml, &plan)) {
             throw HostError(
                 LocatedMessage(options.fPlanPath, 0, "the plan could not be turned into XML"));
@@ -744,7 +781,9 @@ bool WriteOutputs(const FitOptions& options, const DataDictionary& dict,
     }
     std::vector<std::unique_ptr<AtomicFileWriter>> writers;
     for (const auto& [path, xml] :
-         {std::pair{&options.fPlanPath, &planXml}, std::pair{&options.fFitStatsPath, &statsXml}}) {
+         {std::pair<const std::string*, const std::string*>{&options.fPlanPath, &planXml},
+          {&options.fFitStatsPath, &statsXml},
+          {&options.fJsonPath, &json}}) {
         if (path->empty()) {
             continue;
         }
@@ -773,6 +812,9 @@ bool WriteOutputs(const FitOptions& options, const DataDictionary& dict,
     }
     if (!options.fFitStatsPath.empty()) {
         out << "fitting statistics written to " << options.fFitStatsPath << "\n";
+    }
+    if (!options.fJsonPath.empty()) {
+        out << "results written to " << options.fJsonPath << "\n";
     }
     return true;
 }
@@ -845,6 +887,34 @@ CLI::App* AddFitCommand(CLI::App& app, FitOptions& options) {
                     "A fixed input of the plan, NAME=NUMBER (repeatable; needs -o)")
         ->expected(1)
         ->multi_option_policy(CLI::MultiOptionPolicy::TakeAll);
+    fit->add_option("--json", options.fJsonPath,
+                    "Write every candidate's results, the choices and why, as JSON to this file");
+    fit->add_option("--families", options.fvFamilies,
+                    "Candidate families, FIELD=Normal,Gamma for one field or Normal,Gamma for "
+                    "every field (repeatable)")
+        ->expected(1)
+        ->multi_option_policy(CLI::MultiOptionPolicy::TakeAll);
+    fit->add_option("--exclude", options.fvExclude,
+                    "Families left out, FIELD=Uniform for one field or Uniform for every field "
+                    "(repeatable)")
+        ->expected(1)
+        ->multi_option_policy(CLI::MultiOptionPolicy::TakeAll);
+    fit->add_option("--choose", options.fChoose,
+                    "Rule of the best fit written to the plan: ad, ks, aic or bic (default: the "
+                    "fitting's own, the --test statistic; chi-square for count fields)");
+    fit->add_option("--rank", options.fRank,
+                    "Order of the report's candidates: ad, ks, aic or bic (default: as --test)");
+    fit->add_option("--empirical-below", options.fEmpiricalBelow,
+                    "The plan takes a field's observed distribution when its best fit's p-value "
+                    "(or the upper end of its table interval) is below P (default: off)")
+        ->check(CLI::Range(0.0, 1.0));
+    fit->add_option("--bootstrap", options.fBootstrap,
+                    "Parametric bootstrap: N refits of every candidate for percentile intervals "
+                    "and p-values (default 0: off)")
+        ->transform(WholeNumber(0, 100000))
+        ->capture_default_str();
+    fit->add_option("--seed", options.fSeed, "Seed of the bootstrap's draws")
+        ->transform(WholeNumber(0, 4294967295LL));
     return fit;
 }
 
@@ -964,21 +1034,47 @@ int RunFit(const FitOptions& options, std::ostream& out, std::ostream& err) {
         }
         out << "\n";
 
+        // The choices work on a copy: the statistics document keeps the component's results.
+        DFCOutputStats chosen(*results);
+        const FitRule rank = ParseFitRule(options.fRank, "--rank");
+        FitJsonRun run;
+        run.fChoose = ParseFitRule(options.fChoose, "--choose");
+        run.fRank = rank;
+        run.fEmpiricalBelow =
+            options.fEmpiricalBelow < 0.0 ? MCMV::Missing() : options.fEmpiricalBelow;
+        run.fvDecisions =
+            ApplyFitChoice(chosen, run.fChoose, run.fEmpiricalBelow, settings.GetGFType());
+        RankReported(chosen, rank);
+
         const auto& covInfo = settings.GetCovariateInfoElems();
-        const auto& covariates = results->GetCovarDistInfo();
+        const auto& covariates = chosen.GetCovarDistInfo();
         for (std::size_t i = 0; i < covariates.size(); ++i) {
             const int index = settings.GetCovariates()[i];
             PrintCovariate(out, covariates[i], covInfo[i],
-                           dict.GetFields()[static_cast<std::size_t>(index)], settings.GetGFType());
+                           dict.GetFields()[static_cast<std::size_t>(index)], settings.GetGFType(),
+                           run.fvDecisions[i], rank);
         }
-        for (const auto& info : results->GetFactorDistInfo()) {
+        for (const auto& info : chosen.GetFactorDistInfo()) {
             PrintFactor(out, info);
         }
-        PrintCorrelations(out, *results);
-        PrintCrosstabs(out, *results);
+        PrintCorrelations(out, chosen);
+        PrintCrosstabs(out, chosen);
         PrintWarnings(out, algorithm.GetWarnings());
 
-        if (!WriteOutputs(options, dict, fields, *results, model.get(), interrupt, out, err)) {
+        std::string json;
+        if (!options.fJsonPath.empty()) {
+            run.fDataPath = path;
+            run.fRowsRead = algorithm.GetNRecords();
+            run.fRowsUsed = algorithm.GetNValidRecords();
+            run.fTotalWeight = algorithm.GetValidWeight();
+            run.fWeightField = options.fWeight;
+            run.fTest = options.fTest;
+            run.fSeed = options.fSeed;
+            run.fBootstrapReplicates = options.fBootstrap;
+            json = FitResultsToJson(run, chosen, algorithm.GetWarnings()).dump(2) + "\n";
+        }
+        if (!WriteOutputs(options, dict, fields, *results, chosen, json, model.get(), interrupt,
+                          out, err)) {
             err << "mcsim: interrupted after the fitting; the results are printed above, but "
                    "no file was written\n";
             return ExitStatus::kInterrupted;

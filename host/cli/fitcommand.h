@@ -40,6 +40,14 @@ struct FitOptions {
     std::string fModelPath;             //!< --model: the formula model to record
     std::vector<std::string> fvTargets; //!< --targets: the model targets to record
     std::vector<std::string> fvFixed;   //!< --fixed NAME=VALUE: fixed inputs of the plan
+    std::string fJsonPath;              //!< --json: the results document, "" none
+    std::vector<std::string> fvFamilies; //!< --families [FIELD=]Family,...: candidates kept
+    std::vector<std::string> fvExclude;  //!< --exclude [FIELD=]Family,...: candidates left out
+    std::string fChoose;                 //!< --choose ad|ks|aic|bic, "" the component's rule
+    std::string fRank;                   //!< --rank ad|ks|aic|bic, "" the component's order
+    double fEmpiricalBelow = -1.0;       //!< --empirical-below P, negative off
+    int fBootstrap = 0;                  //!< --bootstrap N refits per candidate, 0 off
+    std::int64_t fSeed = -1;             //!< --seed of the bootstrap; negative the default
 };
 
 //! Adds the `fit` subcommand to `app`, storing into `options`; returns it.
