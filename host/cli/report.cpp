@@ -9,6 +9,7 @@
 
 #include <algorithm>
 #include <cmath>
+#include <cstdint>
 #include <unordered_map>
 
 namespace MCHost {
@@ -172,40 +173,72 @@ ReportContinuousTarget BuildContinuous(const MCMCSP_800::SECContinuousTargetInfo
 
 //! The pairs of correlated inputs, in the order of the plan's correlation variables (the order
 //! of the simulated matrix), or of the covariates when the plan sets no correlations.
+//! Positions are found through hashes, so N inputs cost O(N²): one step per pair.
 std::vector<ReportCorrelation> BuildCorrelations(const SECOutputStats& stats) {
+    constexpr std::size_t kNone = static_cast<std::size_t>(-1);
     const SPCSettings& plan = *stats.GetSPCSettings();
     const std::vector<std::string>& names =
         plan.GetCorrVarList().empty() ? stats.GetCovariateNames() : plan.GetCorrVarList();
-    std::vector<SPCSettings::CorrMatrixCell> cells;
-    plan.GetCorrMatrixCellCollection(cells);
+    const std::size_t n = names.size();
+    std::unordered_map<std::string, std::size_t> position;
+    position.reserve(n);
+    for (std::size_t i = 0; i < n; ++i) {
+        position.emplace(names[i], i);
+    }
+    // The plan's triangle: row r holds the correlations with the variables before it.
+    const std::vector<std::string>& planVars = plan.GetCorrVarList();
+    const std::vector<std::vector<double>>& planRows = plan.GetCorrMatrix();
+    std::vector<std::size_t> inPlan(n, kNone);
+    for (std::size_t k = 0; k < planVars.size() && k < planRows.size(); ++k) {
+        const auto it = position.find(planVars[k]);
+        if (it != position.end()) {
+            inPlan[it->second] = k;
+        }
+    }
+    const auto planValue = [&](std::size_t i, std::size_t j) {
+        const std::size_t a = inPlan[i];
+        const std::size_t b = inPlan[j];
+        if (a == kNone || b == kNone || a == b) {
+            return MCMV::Missing();
+        }
+        const std::vector<double>& row = planRows[std::max(a, b)];
+        return std::min(a, b) < row.size() ? row[std::min(a, b)] : MCMV::Missing();
+    };
+    // The correlation model's pairs by the positions of their inputs (the last one counts).
+    const auto& modelPairs = stats.GetInputCorrelationPairs();
+    std::unordered_map<std::uint64_t, std::size_t> modelOf;
+    modelOf.reserve(modelPairs.size());
+    for (std::size_t m = 0; m < modelPairs.size(); ++m) {
+        const auto a = position.find(modelPairs[m].fFirst);
+        const auto b = position.find(modelPairs[m].fSecond);
+        if (a != position.end() && b != position.end()) {
+            const std::uint64_t lo = std::min(a->second, b->second);
+            const std::uint64_t hi = std::max(a->second, b->second);
+            modelOf[lo * n + hi] = m;
+        }
+    }
     const MCMath_800::MCSymMatrix& simulated = stats.GetSimulCorr();
+    const double nCases = stats.GetValidCaseCount();
     std::vector<ReportCorrelation> pairs;
-    for (std::size_t i = 0; i < names.size(); ++i) {
-        for (std::size_t j = i + 1; j < names.size(); ++j) {
+    pairs.reserve(n * (n - std::min<std::size_t>(n, 1)) / 2);
+    for (std::size_t i = 0; i < n; ++i) {
+        for (std::size_t j = i + 1; j < n; ++j) {
             ReportCorrelation pair{names[i], names[j], MCMV::Missing(), MCMV::Missing()};
-            for (const SPCSettings::CorrMatrixCell& cell : cells) {
-                if ((cell.fRowVar == names[i] && cell.fColVar == names[j]) ||
-                    (cell.fRowVar == names[j] && cell.fColVar == names[i])) {
-                    pair.fPlan = cell.fValue;
-                }
-            }
+            pair.fPlan = planValue(i, j);
             if (static_cast<int>(j) < simulated.GetNRows()) {
                 pair.fSimulated = simulated.GetElem(static_cast<int>(i), static_cast<int>(j));
             }
-            for (const MCMCSP_800::SECInputCorrelationPair& model :
-                 stats.GetInputCorrelationPairs()) {
-                if ((model.fFirst == names[i] && model.fSecond == names[j]) ||
-                    (model.fFirst == names[j] && model.fSecond == names[i])) {
-                    pair.fNormal = model.fNormalCorr;
-                    pair.fLow = model.fAttainableLow;
-                    pair.fHigh = model.fAttainableHigh;
-                    pair.fbUnreachable = model.fbUnreachable;
-                }
+            const auto model = modelOf.find(static_cast<std::uint64_t>(i) * n + j);
+            if (model != modelOf.end()) {
+                const MCMCSP_800::SECInputCorrelationPair& m = modelPairs[model->second];
+                pair.fNormal = m.fNormalCorr;
+                pair.fLow = m.fAttainableLow;
+                pair.fHigh = m.fAttainableHigh;
+                pair.fbUnreachable = m.fbUnreachable;
             }
-            const double n = stats.GetValidCaseCount();
-            if (!MCMV::IsMissing(pair.fPlan) && !MCMV::IsMissing(pair.fSimulated) && n > 1) {
+            if (!MCMV::IsMissing(pair.fPlan) && !MCMV::IsMissing(pair.fSimulated) && nCases > 1) {
                 const double rho = std::clamp(pair.fPlan, -1.0, 1.0);
-                const double se = (1.0 - rho * rho) / std::sqrt(n - 1.0);
+                const double se = (1.0 - rho * rho) / std::sqrt(nCases - 1.0);
                 pair.fDeviation = std::fabs(pair.fSimulated - pair.fPlan) / std::max(se, 1e-12);
             }
             pairs.push_back(std::move(pair));

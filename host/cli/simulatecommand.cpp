@@ -9,6 +9,7 @@
 #include "common/atomicfile.h"
 #include "common/hosterror.h"
 #include "component/mcspassert.h"
+#include "data/planchecks.h"
 #include "data/plandictionary.h"
 #include "mccommon/hostinterfaces.h"
 #include "mccommon/numtext.h"
@@ -59,76 +60,6 @@ const std::uint32_t kDefaultSeed = SECSettings().GetSeed();
 
 // ------------------------------------------------------------------------------------------
 // Reading the plan and the model
-
-std::string ReadWholeFile(const std::string& path, const char* what) {
-    std::ifstream in(path, std::ios::in | std::ios::binary);
-    if (!in.is_open()) {
-        throw HostError(LocatedMessage(
-            path, 0, std::string("cannot open the ") + what + ": " + std::strerror(errno)));
-    }
-    std::ostringstream text;
-    text << in.rdbuf();
-    if (in.bad()) {
-        throw HostError(LocatedMessage(path, 0, std::string("reading the ") + what + " failed"));
-    }
-    return text.str();
-}
-
-//! The XML parser's "line L, column C: message" as "path:L:C: message".
-std::string XmlErrorMessage(const std::string& path, const std::string& message) {
-    // "line " digits ", column " digits ": " rest
-    const auto digitsAt = [&message](std::size_t pos) {
-        std::size_t end = pos;
-        while (end < message.size() && std::isdigit(static_cast<unsigned char>(message[end]))) {
-            ++end;
-        }
-        return end;
-    };
-    const std::string kLine = "line ";
-    const std::string kColumn = ", column ";
-    if (message.compare(0, kLine.size(), kLine) == 0) {
-        const std::size_t lineEnd = digitsAt(kLine.size());
-        if (lineEnd > kLine.size() && message.compare(lineEnd, kColumn.size(), kColumn) == 0) {
-            const std::size_t columnStart = lineEnd + kColumn.size();
-            const std::size_t columnEnd = digitsAt(columnStart);
-            if (columnEnd > columnStart && message.compare(columnEnd, 2, ": ") == 0) {
-                return path + ":" + message.substr(kLine.size(), lineEnd - kLine.size()) + ":" +
-                       message.substr(columnStart, columnEnd - columnStart) +
-                       ": not well-formed XML: " + message.substr(columnEnd + 2);
-            }
-        }
-    }
-    return LocatedMessage(path, 0, "not a readable XML document: " + message);
-}
-
-//! Reads the plan file. Throws naming the file for a file that cannot be read, is not XML, is
-//! not a simulation plan, or that the plan reader refuses.
-SPCSettings ReadPlan(const std::string& path) {
-    const std::string text = ReadWholeFile(path, "plan file");
-    MCXML_800::MCXMLReadWrite xml;
-    if (!xml.ParseToDOM(text)) {
-        throw HostError(XmlErrorMessage(path, xml.GetErrorMessage()));
-    }
-    const xercesc::DOMElement* root = xml.GetDocument()->getDocumentElement();
-    const XMLCh* local = root->getLocalName() ? root->getLocalName() : root->getTagName();
-    const std::string rootName = MCXML_800::ToUTF8(local);
-    if (rootName != "SimulationPlan") {
-        throw HostError(LocatedMessage(path, 0,
-                                       "the document is a <" + rootName +
-                                           ">, not a simulation plan (<SimulationPlan>)"));
-    }
-    SPCSettings plan;
-    SPCSettings* target = &plan;
-    MCMCSP_800::MCPlanXMLHandler handler;
-    if (!handler.ParsePlanFile(xml.GetDocument(), target)) {
-        throw HostError(LocatedMessage(
-            path, 0,
-            "the plan reader refused the file: an element or attribute it requires is missing "
-            "or holds a value it cannot read (as a simulated field without a distribution, or "
-            "a number such as INF)"));
-    }
-    return plan;
-}
 
 //! The model file: --model, else the plan's model file relative to the plan's folder.
 std::string ModelPath(const SimulateOptions& options, const SPCSettings& plan) {
@@ -307,12 +238,13 @@ struct PreparedPlan {
     std::string fModelPath;                         //!< the model file
     std::unique_ptr<PlanDictionary> fpDict;         //!< the variables of plan and model
     std::unique_ptr<FormulaScoreFactory> fpFactory; //!< scores the cases
+    std::vector<std::string> fvWarnings;            //!< what the plan checks noted
 };
 
 //! Reads the plan and the model and checks them against each other; throws naming the file.
 PreparedPlan PreparePlan(const SimulateOptions& options) {
     PreparedPlan prepared;
-    prepared.fPlan = ReadPlan(options.fPlanPath);
+    prepared.fPlan = ReadPlanFile(options.fPlanPath, prepared.fvWarnings);
     SPCSettings& plan = prepared.fPlan;
     prepared.fModelPath = ModelPath(options, plan);
     FormulaModel model = FormulaModel::Load(prepared.fModelPath);
@@ -470,6 +402,9 @@ int RunSimulate(const SimulateOptions& options, std::ostream& out, std::ostream&
     try {
         CheckOptions(options, options.fModelPath);
         PreparedPlan prepared = PreparePlan(options);
+        for (const std::string& warning : prepared.fvWarnings) {
+            err << "mcsim: warning: " << warning << "\n";
+        }
         if (options.fModelPath.empty()) {
             CheckOptions(options, prepared.fModelPath);
         }

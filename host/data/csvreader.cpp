@@ -1,6 +1,7 @@
 #include "data/csvreader.h"
 
 #include "common/hosterror.h"
+#include "data/inputlimits.h"
 
 #include <algorithm>
 #include <filesystem>
@@ -170,7 +171,7 @@ std::string SeparatorName(char delimiter) {
 
 CsvReader::CsvReader(std::istream& in, std::string fileName, char delimiter, bool decimalComma)
     : fpBuf(in.rdbuf()), fFileName(std::move(fileName)), fDelimiter(delimiter),
-      fbDecimalComma(decimalComma) {
+      fbDecimalComma(decimalComma), fMaxFields(InputLimits::Get().fMaxFieldsPerRecord) {
     // The byte-order mark EF BB BF; anything else at the start is data and stays unread.
     if (fpBuf && fpBuf->sgetc() == 0xEF) {
         const auto start = fpBuf->pubseekoff(0, std::ios::cur, std::ios::in);
@@ -257,6 +258,11 @@ bool CsvReader::ReadRecord(std::vector<std::string>& fields) {
     std::size_t nFields = 0;
     std::string* field = nullptr;
     const auto open = [&]() {
+        if (nFields == fMaxFields) {
+            throw HostError(LocatedMessage(fFileName, fRecordLine,
+                                           "a record has more than " + std::to_string(fMaxFields) +
+                                               " fields" + RaiseHint("MCSIM_MAX_FIELDS")));
+        }
         if (nFields == fields.size()) {
             fields.emplace_back();
         }

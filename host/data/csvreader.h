@@ -37,6 +37,10 @@ public:
     CsvReader(std::istream& in, std::string fileName, char delimiter = ',',
               bool decimalComma = false);
 
+    //! Refuses records of more than `n` fields, as soon as the field after the n-th begins
+    //! (so a huge record is never held whole). InputLimits' fields per record unless set.
+    void SetMaxFields(std::size_t n) { fMaxFields = n; }
+
     //! Reads the next record into `fields`, which then holds exactly the record's fields (the
     //! strings already there are reused, so a loop over records allocates little). False, with
     //! `fields` empty, at the end of the input. Throws HostError for a malformed record.
@@ -89,6 +93,7 @@ private:
     long fLine = 1;                  //!< current line
     long fRecordLine = 0;            //!< line where the last record began
     std::uint64_t fBytesFetched = 0; //!< bytes taken from the stream, the byte-order mark included
+    std::size_t fMaxFields;          //!< fields a record may have
 };
 
 //! True when `text`, without surrounding blanks, is a number written with a decimal comma:

@@ -293,6 +293,14 @@ void OpenData(const std::string& path, std::ifstream& in) {
     if (std::filesystem::is_directory(path, ec)) {
         throw HostError(LocatedMessage(path, 0, "is a folder, not a data file"));
     }
+    // A pipe or device cannot be read a second time (the passes after the first read the file
+    // again when its rows do not fit the cache), and /dev/zero has no end: refused at once.
+    const auto status = std::filesystem::status(path, ec);
+    if (!ec && std::filesystem::exists(status) && !std::filesystem::is_regular_file(status)) {
+        throw HostError(LocatedMessage(path, 0,
+                                       "the data file is not a regular file (a pipe or "
+                                       "device); save it to a file first"));
+    }
     in.open(path, std::ios::in | std::ios::binary);
     if (!in.is_open()) {
         throw HostError(LocatedMessage(

@@ -4,6 +4,8 @@
 #include "mccommon/numtext.h"
 
 #include <algorithm>
+#include <unordered_map>
+#include <unordered_set>
 
 namespace MCHost {
 
@@ -84,7 +86,8 @@ PlanInput DescribeInput(const SimInputSpecs& input, const std::string& planPath)
 //! Text inputs the model reads must be listed on a `levels` line with every text they hold.
 void CheckTextInputs(const FormulaModel& model, const std::vector<PlanInput>& inputs,
                      const SPCSettings& plan, const std::string& planPath) {
-    const std::vector<std::string> used = model.GetInputNames();
+    const std::vector<std::string> names = model.GetInputNames();
+    const std::unordered_set<std::string> used(names.begin(), names.end());
     auto levelsOf = [&](const std::string& name) -> const FormulaInputLevels* {
         for (const FormulaInputLevels& l : model.GetInputLevels()) {
             if (l.fName == name) {
@@ -94,7 +97,7 @@ void CheckTextInputs(const FormulaModel& model, const std::vector<PlanInput>& in
         return nullptr;
     };
     auto check = [&](const std::string& name, const std::vector<std::string>& texts) {
-        if (!Contains(used, name)) {
+        if (used.count(name) == 0) {
             return;
         }
         const FormulaInputLevels* levels = levelsOf(name);
@@ -110,8 +113,10 @@ void CheckTextInputs(const FormulaModel& model, const std::vector<PlanInput>& in
                                                planPath + "; list its texts with 'levels " + name +
                                                " \"...\"'"));
         }
+        const std::unordered_set<std::string> listed(levels->fvLabels.begin(),
+                                                     levels->fvLabels.end());
         for (const std::string& text : texts) {
-            if (!Contains(levels->fvLabels, text)) {
+            if (listed.count(text) == 0) {
                 throw HostError(LocatedMessage(model.GetFileName(), levels->fLine,
                                                "'levels " + name + "' does not list \"" + text +
                                                    "\", a category of '" + name + "' in " +
@@ -189,21 +194,20 @@ void CheckStopCriteria(const FormulaModel& model, const SPCSettings& plan,
 //! Correlation variables and contingency factors must be simulated fields.
 void CheckCorrelationsAndTable(const SPCSettings& plan, const std::vector<PlanInput>& inputs,
                                const std::string& planPath) {
-    auto isSimulated = [&](const std::string& name) {
-        return std::any_of(inputs.begin(), inputs.end(),
-                           [&](const PlanInput& in) { return in.fName == name; });
-    };
+    std::unordered_map<std::string, const PlanInput*> byName;
+    for (const PlanInput& in : inputs) {
+        byName.emplace(in.fName, &in);
+    }
     for (const std::string& name : plan.GetCorrVarList()) {
-        if (!isSimulated(name)) {
+        if (byName.count(name) == 0) {
             throw HostError(LocatedMessage(planPath, 0,
                                            "the correlation matrix names '" + name +
                                                "', which is not a simulated field"));
         }
     }
     for (const std::string& name : plan.GetCrstabsFactors()) {
-        const auto it = std::find_if(inputs.begin(), inputs.end(),
-                                     [&](const PlanInput& in) { return in.fName == name; });
-        if (it == inputs.end() || !it->fbCategorical) {
+        const auto it = byName.find(name);
+        if (it == byName.end() || !it->second->fbCategorical) {
             throw HostError(LocatedMessage(planPath, 0,
                                            "the contingency table names '" + name +
                                                "', which is not a categorical simulated field"));

@@ -1,6 +1,7 @@
 #include "models/formulamodel.h"
 
 #include "common/hosterror.h"
+#include "data/inputlimits.h"
 #include "mccommon/mcmv.h"
 #include "mccommon/numtext.h"
 
@@ -14,6 +15,8 @@
 #include <fstream>
 #include <map>
 #include <set>
+#include <sstream>
+#include <unordered_set>
 
 namespace MCHost {
 
@@ -152,6 +155,8 @@ bool StartsWithKeyword(const std::string& s, const std::string& keyword, std::st
 //! of `text`. Throws with `where` for anything else.
 std::vector<std::string> ParseLabels(const std::string& text, const std::string& where) {
     std::vector<std::string> labels;
+    std::unordered_set<std::string> seen; // a hash keeps the duplicate check linear
+    const std::size_t maxLabels = InputLimits::Get().fMaxCategories;
     std::size_t i = 0;
     for (;;) {
         while (i < text.size() && std::isspace(static_cast<unsigned char>(text[i]))) {
@@ -181,8 +186,12 @@ std::vector<std::string> ParseLabels(const std::string& text, const std::string&
             }
             label.push_back(text[i++]);
         }
-        if (std::find(labels.begin(), labels.end(), label) != labels.end()) {
+        if (!seen.insert(label).second) {
             throw HostError(where + "the label \"" + label + "\" is listed twice");
+        }
+        if (labels.size() == maxLabels) {
+            throw HostError(where + "more than " + std::to_string(maxLabels) + " labels" +
+                            RaiseHint("MCSIM_MAX_CATEGORIES"));
         }
         labels.push_back(std::move(label));
     }
@@ -253,10 +262,9 @@ std::string NumberText(double x) {
 // FormulaModel
 
 FormulaModel FormulaModel::Load(const std::string& path) {
-    std::ifstream in(path, std::ios::in | std::ios::binary);
-    if (!in.is_open()) {
-        throw HostError(LocatedMessage(path, 0, "cannot open the model file"));
-    }
+    // A regular file of bounded size, read once: a pipe or /dev/zero is refused.
+    std::istringstream in(
+        ReadInputFile(path, "model file", InputLimits::Get().fMaxModelBytes, "MCSIM_MAX_MODEL_MB"));
     return Parse(in, path);
 }
 

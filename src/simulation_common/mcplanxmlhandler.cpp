@@ -3,9 +3,11 @@
 #include "simulation_common/mcplanxmlhandler.h"
 
 #include "mccommon/mcmv.h"
+#include "mccommon/numtext.h"
 #include "mcxml/mcxmldocument.h"
 #include "mcxml/mcxmlutil.h"
 
+#include <xercesc/dom/DOMProcessingInstruction.hpp>
 #include <xercesc/dom/DOMText.hpp>
 #include <xercesc/util/PlatformUtils.hpp>
 #include <xercesc/util/XMLChar.hpp>
@@ -13,6 +15,7 @@
 #include <cstdio>
 #include <limits>
 #include <stdexcept>
+#include <unordered_map>
 #include <utility>
 
 namespace MCMCSP_800 {
@@ -71,6 +74,93 @@ void Put(DOMElement* element, const std::string& name, double value) {
     if (!MCXML_800::SetAttribute(element, name, value)) {
         throw PlanWriteError("attribute " + name + " not set");
     }
+}
+
+// The correlation cells are not made DOM nodes: a matrix of N variables has N(N+1)/2 cells
+// and as nodes they take some twenty times their text. The CorrMatrix element gets a
+// processing instruction as a place holder, and the cells' text replaces it in the
+// serialised document (SpliceCorrCells).
+constexpr char kCorrCellsTarget[] = "mcsim-corr-cells";
+
+//! `text` as an attribute value in the serialised document: the markup characters and the
+//! blanks that attribute-value normalisation would turn into spaces as references.
+std::string AttributeValueText(const std::string& text) {
+    std::string out;
+    out.reserve(text.size());
+    for (const char c : text) {
+        switch (c) {
+        case '&':
+            out += "&amp;";
+            break;
+        case '<':
+            out += "&lt;";
+            break;
+        case '>':
+            out += "&gt;";
+            break;
+        case '"':
+            out += "&quot;";
+            break;
+        case '\t':
+            out += "&#x9;";
+            break;
+        case '\n':
+            out += "&#xA;";
+            break;
+        case '\r':
+            out += "&#xD;";
+            break;
+        default:
+            out += c;
+        }
+    }
+    return out;
+}
+
+//! The CorrCell elements of `cells`, attributes in the order the serialiser writes them.
+//! Each name goes once through the DOM, so that a name XML cannot carry fails the write as it
+//! would as an attribute, and is written as the DOM holds it.
+std::string CorrCellsText(DOMElement* scratch,
+                          const std::vector<SPCSettings::CorrMatrixCell>& cells) {
+    std::unordered_map<std::string, std::string> written;
+    const auto nameText = [&](const std::string& name) -> const std::string& {
+        auto it = written.find(name);
+        if (it == written.end()) {
+            Put(scratch, "name", name);
+            const std::string held = MCXML_800::ToUTF8(MCXML_800::GetAttribute(scratch, "name"));
+            it = written.emplace(name, AttributeValueText(held)).first;
+        }
+        return it->second;
+    };
+    std::string text;
+    for (const SPCSettings::CorrMatrixCell& cell : cells) {
+        text += "<CorrCell colVar=\"";
+        text += nameText(cell.fColVar);
+        text += "\" rowVar=\"";
+        text += nameText(cell.fRowVar);
+        text += "\" value=\"";
+        text += MCMV::IsMissing(cell.fValue) ? std::string(".")
+                                             : MCCommon_800::FormatRoundTrip(cell.fValue);
+        text += "\"/>";
+    }
+    return text;
+}
+
+//! Replaces the place holder in the serialised `out` by `cellsText`; false without one.
+bool SpliceCorrCells(std::string& out, const std::string& cellsText) {
+    const std::string open = std::string("<?") + kCorrCellsTarget;
+    const std::size_t at = out.find(open);
+    const std::size_t end = at == std::string::npos ? at : out.find("?>", at);
+    if (end == std::string::npos) {
+        return false;
+    }
+    std::string spliced;
+    spliced.reserve(out.size() + cellsText.size());
+    spliced.append(out, 0, at);
+    spliced += cellsText;
+    spliced.append(out, end + 2, std::string::npos);
+    out.swap(spliced);
+    return true;
 }
 
 void PutCount(DOMElement* element, const std::string& name, std::size_t count) {
@@ -311,12 +401,14 @@ bool MCPlanXMLHandler::WritePlanFile(std::string& out, const SPCSettings* plan) 
 
         std::vector<SPCSettings::CorrMatrixCell> cells;
         plan->GetCorrMatrixCellCollection(cells);
+        std::string cellsText;
         if (!cells.empty()) {
             DOMElement* corrMatrix = NewElement(root, "CorrMatrix");
-            if (!AddCorrMetrixElement(corrMatrix, cells, plan->GetCorrLocked())) {
+            if (!AddCorrMetrixElement(corrMatrix, cells, plan->GetCorrLocked(), cellsText)) {
                 return false;
             }
             static_cast<void>(InsertElement(root, corrMatrix));
+            cells = std::vector<SPCSettings::CorrMatrixCell>();
         }
 
         if (!plan->GetCrstabsFactors().empty()) {
@@ -333,7 +425,8 @@ bool MCPlanXMLHandler::WritePlanFile(std::string& out, const SPCSettings* plan) 
             return false;
         }
 
-        return WriteFromDOM(out, doc.get());
+        return WriteFromDOM(out, doc.get()) &&
+               (cellsText.empty() || SpliceCorrCells(out, cellsText));
     } catch (...) {
         return false;
     }
@@ -612,23 +705,13 @@ bool MCPlanXMLHandler::AddFixedFieldsEle(DOMElement* fixedFields,
 
 bool MCPlanXMLHandler::AddCorrMetrixElement(DOMElement* corrMatrix,
                                             const std::vector<SPCSettings::CorrMatrixCell>& cells,
-                                            bool locked) {
+                                            bool locked, std::string& cellsText) {
     PutCount(corrMatrix, "numberOfCells", cells.size());
     PutYesNo(corrMatrix, "locked", locked);
-    bool result = true;
-    for (const SPCSettings::CorrMatrixCell& cell : cells) {
-        DOMElement* element = NewElement(corrMatrix, "CorrCell");
-        Put(element, "rowVar", cell.fRowVar);
-        Put(element, "colVar", cell.fColVar);
-        if (!SetDoubleAttribute(element, "value", cell.fValue)) {
-            return false;
-        }
-        result = InsertElement(corrMatrix, element);
-        if (!result) {
-            break;
-        }
-    }
-    return result;
+    cellsText = CorrCellsText(NewElement(corrMatrix, "CorrCell"), cells);
+    xercesc::DOMDocument* doc = corrMatrix->getOwnerDocument();
+    return InsertElement(corrMatrix, doc->createProcessingInstruction(
+                                         ToUTF16(kCorrCellsTarget).c_str(), ToUTF16("").c_str()));
 }
 
 bool MCPlanXMLHandler::AddCrossTabMetrixElement(DOMElement* table,
@@ -768,9 +851,10 @@ bool MCPlanXMLHandler::WriteFittingOutStats(std::string& out, const DFCOutputSta
         // A matrix that cannot be listed gives no cells, and then no CorrMatrix.
         std::vector<SPCSettings::CorrMatrixCell> cells;
         static_cast<void>(SPCSettings::GetCorrMatrixCellCollectionFrom(cells, results));
+        std::string cellsText;
         if (!cells.empty()) {
             DOMElement* corrMatrix = NewElement(root, "CorrMatrix");
-            if (!AddCorrMetrixElement(corrMatrix, cells, false)) {
+            if (!AddCorrMetrixElement(corrMatrix, cells, false, cellsText)) {
                 return false;
             }
             result = InsertElement(root, corrMatrix) && result;
@@ -791,7 +875,8 @@ bool MCPlanXMLHandler::WriteFittingOutStats(std::string& out, const DFCOutputSta
             }
         }
 
-        return result && WriteFromDOM(out, doc.get());
+        return result && WriteFromDOM(out, doc.get()) &&
+               (cellsText.empty() || SpliceCorrCells(out, cellsText));
     } catch (...) {
         return false;
     }
@@ -928,6 +1013,14 @@ bool MCPlanXMLHandler::WriteFromDOM(std::string& out, const xercesc::DOMDocument
     }
     out = std::move(text);
     return true;
+}
+
+const char* MCPlanXMLHandler::GetPlanVersion() {
+    return kPlanVersion;
+}
+
+const char* MCPlanXMLHandler::GetPlanNamespace() {
+    return kPlanNamespace;
 }
 
 std::string MCPlanXMLHandler::GetCurrentTime() {

@@ -28,6 +28,7 @@
 #include <xercesc/dom/DOMElement.hpp>
 #include <xercesc/util/XMLDouble.hpp>
 
+#include <cstdint>
 #include <ctime>
 #include <istream>
 #include <string>
@@ -48,6 +49,51 @@ public:
     LiteralType GetLiteralType() const { return getType(); }
     //! The value of a normal literal.
     double GetValue() const { return getValue(); }
+};
+
+//! The correlation cells of a plan document, read from its text by a streaming (SAX) parser.
+//! A plan of N correlated inputs lists N(N+1)/2 cells, and as DOM nodes they take some twenty
+//! times the bytes of their text (a 3,000-input plan: 240 MB of text, over 6 GB of nodes). So
+//! the cells of the first CorrMatrix under the root are read here, 16 bytes each, and the rest
+//! of the document, with that element's content blanked out, goes to the DOM parser; the
+//! handler then takes the cells from here (SetCorrCells).
+class MCPlanCorrCells {
+public:
+    //! One cell with a value: the positions of its variables in GetNames, and the value (the
+    //! missing value for "." or NaN).
+    struct Cell {
+        std::uint32_t fRow = 0; //!< rowVar
+        std::uint32_t fCol = 0; //!< colVar
+        double fValue = 0.0;    //!< value
+    };
+
+    //! Reads `text`. Sets `rest` to `text` with the content of the first CorrMatrix element
+    //! under the root replaced by its line ends (so that the lines of what follows stay where
+    //! they are). False, with GetErrorMessage "line L, column C: what" (or a message without
+    //! a place), when the text is not a well-formed document.
+    bool Read(const std::string& text, std::string& rest);
+
+    //! True when the document has a CorrMatrix under its root.
+    bool HasMatrix() const { return fbHasMatrix; }
+    //! Number of CorrCell elements of the matrix, with a value or without.
+    std::size_t GetCellElementCount() const { return fCellElements; }
+    //! False when a cell lacks a variable name or holds a value that is not a finite number,
+    //! "." or NaN: the reader then refuses the plan, as it does reading the cell from a DOM.
+    bool AreCellsReadable() const { return fbReadable; }
+    const std::vector<std::string>& GetNames() const { return fvNames; }
+    //! The cells with a value, in document order.
+    const std::vector<Cell>& GetCells() const { return fvCells; }
+    const std::string& GetErrorMessage() const { return fErrorMessage; }
+
+private:
+    friend class MCPlanCorrCellsHandler;
+
+    bool fbHasMatrix = false;         //!< a CorrMatrix was found
+    bool fbReadable = true;           //!< every cell could be read
+    std::size_t fCellElements = 0;    //!< CorrCell elements seen
+    std::vector<std::string> fvNames; //!< variable names, each once, in order of appearance
+    std::vector<Cell> fvCells;        //!< cells with a value
+    std::string fErrorMessage;        //!< why Read failed
 };
 
 class MCPlanXMLHandler {
@@ -88,6 +134,10 @@ public:
     bool ParsePlanFile(std::istream& source, SPCSettings*& plan);
     //! The plan of the last successful read; null before one.
     const SPCSettings* GetSPCSettings() const { return fSettings; }
+    //! Takes the correlation cells of the next documents read from `cells` (read from the same
+    //! text) instead of the document's CorrMatrix children; null goes back to the children.
+    //! `cells` must outlive the reads.
+    void SetCorrCells(const MCPlanCorrCells* cells) { fpCorrCells = cells; }
 
     //! Appends the `value` of every `Probability` child of `parent` to `probs`, in order. False
     //! at the first value that cannot be read (the values before it stay appended); true
@@ -109,6 +159,11 @@ public:
     //! The time stamp of `local`: year.month.day with two-digit month and day, a blank, the
     //! hour without leading zero, ":" and the two-digit minute.
     static std::string FormatTimeStamp(const std::tm& local);
+    //! The version this handler writes on a plan's root ("21.0.0.0"). The reader does not
+    //! examine a document's version or namespace; a host that wants them checked compares.
+    static const char* GetPlanVersion();
+    //! The namespace of the plan documents this handler writes.
+    static const char* GetPlanNamespace();
 
 private:
     // ---- Plan file builders: each fills the element it is given; the caller appends it ----
@@ -127,9 +182,11 @@ private:
 
     // ---- Builders shared with the fitting statistics document ------------------------------
 
-    //! `numberOfCells`, `locked` and one `CorrCell` per cell.
+    //! `numberOfCells`, `locked` and a place holder for the cells, whose text (one `CorrCell`
+    //! per cell) goes to `cellsText`, to replace the place holder once serialised.
     bool AddCorrMetrixElement(xercesc::DOMElement* corrMatrix,
-                              const std::vector<SPCSettings::CorrMatrixCell>& cells, bool locked);
+                              const std::vector<SPCSettings::CorrMatrixCell>& cells, bool locked,
+                              std::string& cellsText);
     //! The counts, `CrossFactors` and one `TableCell` per row.
     bool AddCrossTabMetrixElement(xercesc::DOMElement* table,
                                   const std::vector<std::string>& factors,
@@ -177,6 +234,7 @@ private:
     SPCSettings* fSettings = nullptr; //!< plan of the last successful read, not owned
     MCXML_800::MCVarList fVarList;    //!< the host's variables, when given
     bool fHasVarList = false;         //!< complete and validate plans against fVarList
+    const MCPlanCorrCells* fpCorrCells = nullptr; //!< cells read by the streaming parser
 };
 
 } // namespace MCMCSP_800

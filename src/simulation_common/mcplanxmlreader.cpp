@@ -20,6 +20,8 @@
 #include <algorithm>
 #include <cmath>
 #include <cstddef>
+#include <iterator>
+#include <unordered_map>
 
 namespace MCMCSP_800 {
 
@@ -487,23 +489,38 @@ bool MCPlanXMLHandler::ParsePlanFile(const xercesc::DOMDocument* doc, SPCSetting
     }
 }
 
+// A text is read in two parts: the correlation cells through the streaming parser, the rest
+// of the document (the cells blanked out) through the DOM, so that a large matrix never
+// becomes a tree of nodes.
 bool MCPlanXMLHandler::ParsePlanFile(const std::string& source, SPCSettings*& plan) {
+    const MCPlanCorrCells* const previous = fpCorrCells;
     try {
+        MCPlanCorrCells cells;
+        std::string rest;
+        if (!cells.Read(source, rest)) {
+            return false;
+        }
         MCXML_800::MCXMLReadWrite parser;
-        static_cast<void>(parser.ParseToDOM(source));
+        static_cast<void>(parser.ParseToDOM(rest));
         const xercesc::DOMDocument* doc = parser.GetDocument();
-        return doc != nullptr && ParseDocument(doc, plan);
+        fpCorrCells = &cells;
+        const bool read = doc != nullptr && ParseDocument(doc, plan);
+        fpCorrCells = previous;
+        return read;
     } catch (...) {
+        fpCorrCells = previous;
         return false;
     }
 }
 
 bool MCPlanXMLHandler::ParsePlanFile(std::istream& source, SPCSettings*& plan) {
     try {
-        MCXML_800::MCXMLReadWrite parser;
-        static_cast<void>(parser.ParseToDOM(source));
-        const xercesc::DOMDocument* doc = parser.GetDocument();
-        return doc != nullptr && ParseDocument(doc, plan);
+        if (!source.good()) {
+            return false;
+        }
+        const std::string text((std::istreambuf_iterator<char>(source)),
+                               std::istreambuf_iterator<char>());
+        return !source.bad() && ParsePlanFile(text, plan);
     } catch (...) {
         return false;
     }
@@ -735,6 +752,77 @@ bool MCPlanXMLHandler::HandleFixedFieldElement(DOMElement* fixedFields, SPCSetti
     return true;
 }
 
+namespace {
+
+// The correlation triangle being read: each variable's position is found through a hash, so
+// n cells cost O(n) (setting them one by one in the plan searches its variable list for each).
+// Each new variable adds a row as long as the variable list, so the triangle is capped by the
+// number of cells the document spells out. A plan that already holds correlations gets the
+// cells one by one instead.
+class CorrTriangle {
+public:
+    CorrTriangle(const SPCSettings& plan, std::size_t nCellElements)
+        : fMaxEntries(std::max(kMinCorrTriangleEntries, nCellElements)),
+          fbDirect(plan.GetCorrVarList().empty() && plan.GetCorrMatrix().empty()),
+          fvVars(plan.GetCorrVarList()) {
+        for (const std::string& name : fvVars) {
+            fPositions.emplace(name, fPositions.size());
+        }
+    }
+
+    //! Sets one cell; false when the triangle would grow beyond the cap.
+    bool Set(const std::string& rowVar, const std::string& colVar, double value,
+             SPCSettings& plan) {
+        const std::size_t nVars = fvVars.size() + (fPositions.count(rowVar) == 0 ? 1 : 0) +
+                                  (colVar != rowVar && fPositions.count(colVar) == 0 ? 1 : 0);
+        if (nVars * (nVars + 1) / 2 > fMaxEntries) {
+            return false;
+        }
+        // The column variable is registered first, as the plan does.
+        const std::size_t c = PositionOf(colVar);
+        const std::size_t r = PositionOf(rowVar);
+        if (!fbDirect) {
+            plan.SetCorrMatrixCell(rowVar, colVar, value);
+        } else if (r != c) {
+            fvvRows[std::max(r, c)][std::min(r, c)] = value;
+        }
+        return true;
+    }
+
+    //! Hands the triangle to the plan.
+    void Finish(SPCSettings& plan) {
+        if (!fbDirect || fvVars.empty()) {
+            return;
+        }
+        plan.SetCorrVarList(fvVars);
+        for (std::vector<double>& row : fvvRows) {
+            plan.AddCorrMatrixRow(row);
+            row = std::vector<double>();
+        }
+    }
+
+private:
+    std::size_t PositionOf(const std::string& name) {
+        const auto [it, added] = fPositions.emplace(name, fvVars.size());
+        if (added) {
+            fvVars.push_back(name);
+            if (fbDirect) {
+                fvvRows.emplace_back(fvVars.size(), 0.0);
+                fvvRows.back().back() = 1.0;
+            }
+        }
+        return it->second;
+    }
+
+    std::size_t fMaxEntries;                                 //!< cap on the triangle's entries
+    bool fbDirect;                                           //!< built here, handed over at the end
+    std::vector<std::string> fvVars;                         //!< variables in order
+    std::unordered_map<std::string, std::size_t> fPositions; //!< name -> position in fvVars
+    std::vector<std::vector<double>> fvvRows;                //!< the triangle's rows
+};
+
+} // namespace
+
 bool MCPlanXMLHandler::HandleCorrMetrixElement(DOMElement* corrMatrix, SPCSettings*& plan) {
     int nCells = 0;
     if (!ReadInt(corrMatrix, "numberOfCells", nCells)) {
@@ -747,10 +835,22 @@ bool MCPlanXMLHandler::HandleCorrMetrixElement(DOMElement* corrMatrix, SPCSettin
         }
         plan->SetCorrLocked(text == "yes");
     }
-    // Each new variable adds a row as long as the variable list: cap the triangle by what
-    // the document spells out.
-    const std::size_t maxEntries =
-        std::max(kMinCorrTriangleEntries, CountChildren(corrMatrix, "CorrCell"));
+    if (fpCorrCells != nullptr && fpCorrCells->HasMatrix()) {
+        // The cells came through the streaming parser; the element here has none.
+        if (!fpCorrCells->AreCellsReadable()) {
+            return false;
+        }
+        CorrTriangle triangle(*plan, fpCorrCells->GetCellElementCount());
+        const std::vector<std::string>& names = fpCorrCells->GetNames();
+        for (const MCPlanCorrCells::Cell& cell : fpCorrCells->GetCells()) {
+            if (!triangle.Set(names[cell.fRow], names[cell.fCol], cell.fValue, *plan)) {
+                return false;
+            }
+        }
+        triangle.Finish(*plan);
+        return true;
+    }
+    CorrTriangle triangle(*plan, CountChildren(corrMatrix, "CorrCell"));
     for (DOMElement* cell = First(corrMatrix, "CorrCell"); cell != nullptr;
          cell = Next(cell, "CorrCell")) {
         std::string rowVar;
@@ -765,17 +865,11 @@ bool MCPlanXMLHandler::HandleCorrMetrixElement(DOMElement* corrMatrix, SPCSettin
         if (text != "." && !ReadNumber(cell, "value", value, MissingValue::kAllowed)) {
             return false;
         }
-        const std::vector<std::string>& vars = plan->GetCorrVarList();
-        const auto isNew = [&vars](const std::string& name) {
-            return std::find(vars.begin(), vars.end(), name) == vars.end();
-        };
-        const std::size_t nVars =
-            vars.size() + (isNew(rowVar) ? 1 : 0) + (colVar != rowVar && isNew(colVar) ? 1 : 0);
-        if (nVars * (nVars + 1) / 2 > maxEntries) {
+        if (!triangle.Set(rowVar, colVar, value, *plan)) {
             return false;
         }
-        plan->SetCorrMatrixCell(rowVar, colVar, value);
     }
+    triangle.Finish(*plan);
     return true;
 }
 

@@ -8,6 +8,7 @@
 #include <algorithm>
 #include <cmath>
 #include <initializer_list>
+#include <unordered_map>
 
 namespace MCMCSP_800 {
 
@@ -536,8 +537,12 @@ void SimInputSpecs::AdjustCategories(const IMCVariable* var) {
         return;
     }
     std::vector<std::string> hostCats;
+    // Each plan category is found through a hash: K categories cost O(K), not O(K²). The
+    // first of two equal host categories keeps the code, as a search from the front would.
+    std::unordered_map<std::string, std::size_t> hostIndex;
     for (int k = 0; k < view->GetNCategories(); ++k) {
         hostCats.push_back(view->GetCategoryText(k));
+        hostIndex.emplace(hostCats.back(), hostCats.size() - 1);
     }
 
     fvUnmatchedCategories.clear();
@@ -553,12 +558,12 @@ void SimInputSpecs::AdjustCategories(const IMCVariable* var) {
         std::vector<double> probs(hostCats.size(), 0.0);
         double sum = 0.0;
         for (std::size_t i = 0; i < planCats.size(); ++i) {
-            const auto it = std::find(hostCats.begin(), hostCats.end(), planCats[i]);
+            const auto it = hostIndex.find(planCats[i]);
             const double p = i < planProbs.size() ? planProbs[i] : 0.0;
-            if (it != hostCats.end()) {
+            if (it != hostIndex.end()) {
                 // Adding rather than storing keeps the sum right should the plan list a
                 // category twice.
-                probs[static_cast<std::size_t>(it - hostCats.begin())] += p;
+                probs[it->second] += p;
                 sum += p;
             } else if (d == 0) {
                 fvUnmatchedCategories.push_back(planCats[i]);

@@ -6,7 +6,16 @@
 // WritePlanFile, and written text is read once more. Nothing may crash, leak an exception,
 // touch memory it does not own or run into undefined behaviour; whether each step succeeds
 // is the document's business.
+//
+// The correlation cells of a text are read by a streaming parser; the same document read
+// wholly through the DOM must give the same correlation variables and triangle. The host's
+// plan checks run on every plan read and may only answer with their HostError.
+#include "common/hosterror.h"
+#include "data/inputlimits.h"
+#include "data/planchecks.h"
+#include "mccommon/mcmv.h"
 #include "mccommon/variables.h"
+#include "mcxml/mcxmlreadwrite.h"
 #include "simulation_common/mcplanxmlhandler.h"
 #include "simulation_common/spcsettings.h"
 
@@ -70,6 +79,65 @@ void ReadWriteRead(MCPlanXMLHandler& handler, const std::string& text) {
     static_cast<void>(reader.ParsePlanFile(written, againTarget));
 }
 
+//! Equal triangles, a missing value equal to a missing value.
+bool SameTriangle(const std::vector<std::vector<double>>& a,
+                  const std::vector<std::vector<double>>& b) {
+    if (a.size() != b.size()) {
+        return false;
+    }
+    for (std::size_t r = 0; r < a.size(); ++r) {
+        if (a[r].size() != b[r].size()) {
+            return false;
+        }
+        for (std::size_t c = 0; c < a[r].size(); ++c) {
+            const bool missing = MCCommon_800::MCMV::IsMissing(a[r][c]);
+            if (missing != MCCommon_800::MCMV::IsMissing(b[r][c]) ||
+                (!missing && a[r][c] != b[r][c])) {
+                return false;
+            }
+        }
+    }
+    return true;
+}
+
+//! Reads `text` as the host does (cells streamed, the rest as a DOM, the host's checks
+//! around the reader) and, wholly through the DOM, compares the correlations.
+void ReadAsHost(const std::string& text) {
+    MCMCSP_800::MCPlanCorrCells cells;
+    std::string rest;
+    MCXML_800::MCXMLReadWrite xml;
+    if (!cells.Read(text, rest) || !xml.ParseToDOM(rest)) {
+        return;
+    }
+    SPCSettings streamed;
+    SPCSettings* streamedTarget = &streamed;
+    MCPlanXMLHandler handler;
+    handler.SetCorrCells(&cells);
+    try {
+        MCHost::CheckXmlAttributeCounts(text, "fuzz.xml");
+        const MCHost::PlanSource source("fuzz.xml", text);
+        static_cast<void>(MCHost::CheckPlanDocument(xml.GetDocument(), source));
+        if (handler.ParsePlanFile(xml.GetDocument(), streamedTarget)) {
+            MCHost::CheckPlanValues(streamed, source);
+        }
+    } catch (const MCHost::HostError&) {
+        // The checks' answer to a plan they refuse.
+    }
+    MCXML_800::MCXMLReadWrite whole;
+    SPCSettings direct;
+    SPCSettings* directTarget = &direct;
+    SPCSettings again;
+    SPCSettings* againTarget = &again;
+    MCPlanXMLHandler domOnly;
+    MCPlanXMLHandler streamOnly;
+    if (whole.ParseToDOM(text) && domOnly.ParsePlanFile(whole.GetDocument(), directTarget) &&
+        streamOnly.ParsePlanFile(text, againTarget) &&
+        (direct.GetCorrVarList() != again.GetCorrVarList() ||
+         !SameTriangle(direct.GetCorrMatrix(), again.GetCorrMatrix()))) {
+        std::abort();
+    }
+}
+
 } // namespace
 
 extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
@@ -79,5 +147,6 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
     ReadWriteRead(plain, text);
     MCPlanXMLHandler checked(vars, "fuzz", false);
     ReadWriteRead(checked, text);
+    ReadAsHost(text);
     return 0;
 }

@@ -469,6 +469,18 @@ std::vector<std::string> PlanWith(const hosttest::TempDir& dir,
     return {dir.Write("plan.xml", DemandPlan(edits))};
 }
 
+//! The example plan with a contingency table over 'region': two cells of probability `p`,
+//! for "north" and for `category`.
+std::vector<std::string> PlanWithTable(const hosttest::TempDir& dir, const std::string& p,
+                                       const std::string& category) {
+    const std::string cell = "<TableCell probability=\"" + p + "\"><CrossCategory category=\"";
+    return PlanWith(dir, {{"<Settings ", "<ContingencyTable numOfCrossFactors=\"1\" "
+                                         "numOfCrossProbValues=\"2\"><CrossFactors><Factor "
+                                         "name=\"region\"/></CrossFactors>" +
+                                             cell + "north\"/></TableCell>" + cell + category +
+                                             "\"/></TableCell></ContingencyTable><Settings "}});
+}
+
 std::vector<std::string> PlanAndModel(const hosttest::TempDir& dir, const std::string& model) {
     return {dir.Write("plan.xml", DemandPlan()), "--model", dir.Write("bad.model", model)};
 }
@@ -511,6 +523,69 @@ INSTANTIATE_TEST_SUITE_P(
                               "threshold=\"1\" frequency=\"10\"/></Criteria></Settings>"}});
                  },
                  "a stop criterion names 'volume_band', which is not a continuous target"},
+        // The plan checks: one line naming the file, the line, the field and the value.
+        BadInput{"UnknownDistribution",
+                 [](const hosttest::TempDir& d) {
+                     return PlanWith(d, {{"<DistNormal numberOfParamSets=\"1\"><Parameters "
+                                          "mean=\"20\" stddev=\"2\"/></DistNormal>",
+                                          "<DistPert><Parameters min=\"1\" mode=\"2\" "
+                                          "max=\"3\"/></DistPert>"}});
+                 },
+                 "plan.xml:23: simulated field 'price': <DistPert> is not a distribution"},
+        BadInput{"NegativeStddev",
+                 [](const hosttest::TempDir& d) {
+                     return PlanWith(d, {{"stddev=\"2\"", "stddev=\"-2\""}});
+                 },
+                 "plan.xml:22: simulated field 'price' (Normal): mean=20 stddev=-2 is outside "
+                 "the family's domain (stddev >= 0)"},
+        BadInput{"BinomialTrialsNotWhole",
+                 [](const hosttest::TempDir& d) {
+                     return PlanWith(d, {{"<DistNormal numberOfParamSets=\"1\"><Parameters "
+                                          "mean=\"20\" stddev=\"2\"/></DistNormal>",
+                                          "<DistBinomial><Parameters n=\"2.5\" "
+                                          "prob=\"0.5\"/></DistBinomial>"}});
+                 },
+                 "'price' (Binomial): n=2.5 prob=0.5 is outside the family's domain (n a whole"},
+        BadInput{"CorrelationAboveOne",
+                 [](const hosttest::TempDir& d) {
+                     return PlanWith(d, {{"value=\"-0.4\"", "value=\"1.5\""}});
+                 },
+                 "plan.xml:43: the correlation of 'units' and 'price' is 1.5; a correlation lies "
+                 "between -1 and 1"},
+        BadInput{"CategoryTwice",
+                 [](const hosttest::TempDir& d) {
+                     return PlanWith(d, {{"value=\"west\"", "value=\"north\""}});
+                 },
+                 "plan.xml:28: simulated field 'region' (Categorical): the category \"north\" "
+                 "is listed twice"},
+        BadInput{"NegativeProbability",
+                 [](const hosttest::TempDir& d) {
+                     return PlanWith(d, {{"value=\"0.2\"", "value=\"-0.2\""}});
+                 },
+                 "'region' (Categorical): no valid probabilities: each must be a number >= 0"},
+        BadInput{"FieldNameTwice",
+                 [](const hosttest::TempDir& d) {
+                     return PlanWith(d, {{"name=\"unit_cost\"", "name=\"price\""}});
+                 },
+                 "plan.xml:37: the field name 'price' is used twice"},
+        BadInput{"TableCategoryUnknown",
+                 [](const hosttest::TempDir& d) { return PlanWithTable(d, "0.5", "east"); },
+                 "the contingency table has the category \"east\", which 'region' does not have"},
+        BadInput{"TableAllZero",
+                 [](const hosttest::TempDir& d) { return PlanWithTable(d, "0", "south"); },
+                 "the contingency table has every probability is 0"},
+        BadInput{"OtherMajorVersion",
+                 [](const hosttest::TempDir& d) {
+                     return PlanWith(d, {{"version=\"21.0.0.0\"", "version=\"99.0\""}});
+                 },
+                 "plan.xml:11: the plan is of version '99.0'; this program reads version 21 "
+                 "plans (21.0.0.0)"},
+        BadInput{"OtherNamespace",
+                 [](const hosttest::TempDir& d) {
+                     return PlanWith(d, {{"xmlns=\"http://xml.mcsim.org/software/analytics/",
+                                          "xmlns=\"urn:other/"}});
+                 },
+                 "the plan is of the namespace 'urn:other/"},
         BadInput{"MissingModel",
                  [](const hosttest::TempDir& d) {
                      return std::vector<std::string>{d.Write("plan.xml", DemandPlan()), "--model",
