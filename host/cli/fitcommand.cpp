@@ -1,6 +1,7 @@
 #include "cli/fitcommand.h"
 
 #include "cli/commandline.h"
+#include "cli/fitbootstrap.h"
 #include "cli/fitjson.h"
 #include "cli/fitoptions.h"
 #include "cli/interrupt.h"
@@ -48,6 +49,10 @@ const std::vector<DistType> kContinuousCandidates = {
     kDistWeibull,   kDistGamma,  kDistBeta,       kDistExponential};
 //! Candidates of an ordinal field: the discrete families tested by chi-square.
 const std::vector<DistType> kOrdinalCandidates = {kDistBinomial, kDistNegbinomial, kDistPoisson};
+//! Seed of the bootstrap's streams when --seed is not given.
+constexpr std::uint32_t kDefaultBootstrapSeed = 20240917;
+//! Level of the bootstrap's percentile intervals.
+constexpr double kBootstrapLevel = 0.95;
 //! Rows of the contingency table printed before the rest is summarised.
 constexpr std::size_t kMaxTableRows = 24;
 //! Values of a parameter list printed in full; longer lists show their ends.
@@ -554,6 +559,37 @@ void PrintCrosstabs(std::ostream& out, const DFCOutputStats& stats) {
     }
 }
 
+//! One line per bootstrapped candidate: its 95 % intervals and the bootstrap p-value.
+void PrintBootstrap(std::ostream& out, const std::vector<FitBootstrap>& boots,
+                    const DFCOutputStats& results, int replicates, std::uint32_t seed) {
+    if (boots.empty()) {
+        return;
+    }
+    out << "\nparametric bootstrap: " << replicates << " refits per candidate, seed " << seed
+        << ", 95 % percentile intervals\n";
+    for (const FitBootstrap& b : boots) {
+        const DFCOutputStats::DFCVarDistElement* e = nullptr;
+        for (const auto& info : results.GetCovarDistInfo()) {
+            if (info.fFittedVarName == b.fField) {
+                e = &info.fDistElements[static_cast<std::size_t>(b.fType)];
+            }
+        }
+        if (!e) {
+            continue;
+        }
+        const std::vector<std::string> names = ReportParamNames(b.fType, e->fDistParamNames);
+        out << "  " << b.fField << " " << e->fDistName << " (" << b.fReplicates << " refits):";
+        for (std::size_t j = 0; j < names.size() && j < b.fvLower.size(); ++j) {
+            out << (j == 0 ? " " : ", ") << names[j] << " " << Num(b.fvLower[j]) << " to "
+                << Num(b.fvUpper[j]);
+        }
+        if (!MCMV::IsMissing(b.fPValue)) {
+            out << "; bootstrap p-value " << Num(b.fPValue);
+        }
+        out << "\n";
+    }
+}
+
 void PrintWarnings(std::ostream& out, const std::vector<MCStatus>& warnings) {
     std::map<std::pair<long, bool>, int> counts;
     for (const MCStatus& s : warnings) {
@@ -913,7 +949,9 @@ CLI::App* AddFitCommand(CLI::App& app, FitOptions& options) {
                     "and p-values (default 0: off)")
         ->transform(WholeNumber(0, 100000))
         ->capture_default_str();
-    fit->add_option("--seed", options.fSeed, "Seed of the bootstrap's draws")
+    fit->add_option("--seed", options.fSeed,
+                    "Seed of the bootstrap's draws (default " +
+                        std::to_string(kDefaultBootstrapSeed) + ")")
         ->transform(WholeNumber(0, 4294967295LL));
     return fit;
 }
@@ -1045,6 +1083,24 @@ int RunFit(const FitOptions& options, std::ostream& out, std::ostream& err) {
         run.fvDecisions =
             ApplyFitChoice(chosen, run.fChoose, run.fEmpiricalBelow, settings.GetGFType());
         RankReported(chosen, rank);
+        const std::uint32_t seed = options.fSeed < 0 ? kDefaultBootstrapSeed
+                                                     : static_cast<std::uint32_t>(options.fSeed);
+        if (options.fBootstrap > 0) {
+            FitBootstrapRequest request;
+            request.fReplicates = options.fBootstrap;
+            request.fSeed = seed;
+            request.fSampleSize = static_cast<std::int64_t>(std::llround(algorithm.GetValidWeight()));
+            request.fThreads = settings.GetMaxThreadNum();
+            request.fLevel = kBootstrapLevel;
+            request.fCancelled = [&interrupt] { return interrupt.IsCancelled(); };
+            progress.Show("bootstrap", 0, 0);
+            run.fvBootstraps = RunFitBootstrap(*results, request, threads);
+            progress.Clear();
+            if (interrupt.IsCancelled()) {
+                err << "mcsim: fit cancelled during the bootstrap; nothing was written\n";
+                return ExitStatus::kInterrupted;
+            }
+        }
 
         const auto& covInfo = settings.GetCovariateInfoElems();
         const auto& covariates = chosen.GetCovarDistInfo();
@@ -1059,6 +1115,7 @@ int RunFit(const FitOptions& options, std::ostream& out, std::ostream& err) {
         }
         PrintCorrelations(out, chosen);
         PrintCrosstabs(out, chosen);
+        PrintBootstrap(out, run.fvBootstraps, chosen, options.fBootstrap, seed);
         PrintWarnings(out, algorithm.GetWarnings());
 
         std::string json;
@@ -1069,7 +1126,7 @@ int RunFit(const FitOptions& options, std::ostream& out, std::ostream& err) {
             run.fTotalWeight = algorithm.GetValidWeight();
             run.fWeightField = options.fWeight;
             run.fTest = options.fTest;
-            run.fSeed = options.fSeed;
+            run.fSeed = seed;
             run.fBootstrapReplicates = options.fBootstrap;
             json = FitResultsToJson(run, chosen, algorithm.GetWarnings()).dump(2) + "\n";
         }

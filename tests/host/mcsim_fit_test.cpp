@@ -8,6 +8,7 @@
 #include "simulation_common/spcsettings.h"
 
 #include <gtest/gtest.h>
+#include <nlohmann/json.hpp>
 
 #include <algorithm>
 #include <cstdio>
@@ -261,7 +262,27 @@ INSTANTIATE_TEST_SUITE_P(
                {"-o", "@nodir/p.xml"},
                "nodir/p.xml: cannot create the file",
                "",
-               2}),
+               2},
+        BadRun{"JsonOverThePlan",
+               "",
+               {"-o", "@p.xml", "--json", "@p.xml"},
+               "p.xml: this file is written by -o already",
+               "",
+               2},
+        BadRun{"UnknownFamily", "", {"--families", "unit_price=Gauss"}, "unknown family 'Gauss'",
+               "", 2},
+        BadRun{"UnknownRule", "", {"--choose", "lnl"}, "--choose lnl: expected ad, ks, aic", "",
+               2},
+        BadRun{"RuleWithoutItsStatistic", "", {"--rank", "ks"}, "--rank ks needs --test ks", "",
+               2},
+        BadRun{"FilterOfAnUnfittedField",
+               "",
+               {"--fields", "unit_price", "--exclude", "volume=Normal"},
+               "name field 'volume', which is not among the fitted fields"},
+        BadRun{"NoFamilyLeft",
+               "",
+               {"--fields", "returns", "--families", "Normal"},
+               "leave field 'returns' no candidate family"}),
     [](const auto& p) { return std::string(p.param.name); });
 
 TEST(McsimFit, WritesAPlanThatReadsBack) {
@@ -349,6 +370,63 @@ TEST(McsimFit, ReportsDiagnosticsAndDropReasons) {
         EXPECT_NE(run.out.find(part), std::string::npos) << part << "\n" << run.out;
     }
     EXPECT_EQ(run.out.find("A-D -"), std::string::npos) << run.out;
+}
+
+// --json, the choices and the bootstrap: the plan takes what --choose and --empirical-below
+// say, the document says why and carries every candidate, the filters leave out what they name,
+// and the bootstrap gives the same document with one thread or two.
+TEST(McsimFit, JsonChoicesAndBootstrap) {
+    hosttest::TempDir dir;
+    const std::string data = std::string(MCSIM_EXAMPLES_DIR) +
+                             "/../tests/distribution_fitting/data/gof_nile.csv";
+    const auto fit = [&](const std::vector<std::string>& extra, const std::string& json) {
+        std::vector<std::string> args = {"fit", data, "--json", dir.File(json)};
+        args.insert(args.end(), extra.begin(), extra.end());
+        const CommandRun run = Mcsim(args, dir);
+        EXPECT_EQ(run.status, 0) << run.err;
+        return nlohmann::json::parse(hosttest::ReadFile(dir.File(json)));
+    };
+    // AIC prefers the Gamma of the Nile flows, A² the LogNormal.
+    const auto byAic = fit({"--choose", "aic", "--exclude", "volume=Uniform"}, "aic.json");
+    const auto& field = byAic["fields"][0];
+    EXPECT_EQ(field["best"]["family"], "Gamma");
+    EXPECT_EQ(field["best"]["rule"], "AIC");
+    for (const auto& c : field["candidates"]) {
+        EXPECT_NE(c["family"], "Uniform");
+        if (c["family"] == "Gamma") {
+            EXPECT_EQ(c["parameters"][1]["name"], "rate");
+            EXPECT_GT(c["parameters"][1]["std_error"].get<double>(), 0.0);
+            EXPECT_EQ(c["plots"]["qq"]["sample"].size(), 99u);
+        }
+        if (c["family"] == "Beta") {
+            EXPECT_EQ(c["dropped_reason"], "a value lies outside the family's support");
+        }
+    }
+    const auto byAd = fit({}, "ad.json");
+    EXPECT_EQ(byAd["fields"][0]["best"]["family"], "Lognormal");
+
+    // The LogNormal's p-value 0.2 is below 0.3: the plan takes the observed distribution.
+    const std::string plan = dir.File("plan.xml");
+    const auto fallback = fit({"--empirical-below", "0.3", "-o", plan}, "e.json");
+    EXPECT_TRUE(fallback["fields"][0]["best"]["empirical_fallback"].get<bool>());
+    MCMCSP_800::SPCSettings read;
+    MCMCSP_800::SPCSettings* pRead = &read;
+    MCMCSP_800::MCPlanXMLHandler handler;
+    ASSERT_TRUE(handler.ParsePlanFile(hosttest::ReadFile(plan), pRead));
+    EXPECT_EQ(read.GetSimInput("volume")->GetFinalDistType(), MCSPConst::kDistEmpirical);
+
+    const auto one = fit({"--bootstrap", "40", "--seed", "7", "--threads", "1"}, "b1.json");
+    const auto two = fit({"--bootstrap", "40", "--seed", "7", "--threads", "2"}, "b2.json");
+    EXPECT_EQ(one, two);
+    for (const auto& c : one["fields"][0]["candidates"]) {
+        if (c["family"] == "Gamma") {
+            EXPECT_EQ(c["bootstrap_replicates"], 40);
+            const double shape = c["parameters"][0]["value"];
+            EXPECT_LT(c["parameters"][0]["bootstrap_lower"].get<double>(), shape);
+            EXPECT_GT(c["parameters"][0]["bootstrap_upper"].get<double>(), shape);
+            EXPECT_FALSE(c["statistics"]["anderson_darling"]["bootstrap_p_value"].is_null());
+        }
+    }
 }
 
 } // namespace
