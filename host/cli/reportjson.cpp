@@ -132,9 +132,59 @@ Json Iteration(const ReportIteration& it, const SimulationReport& report) {
     return entry;
 }
 
+//! The document without its iterations (a null in their place).
+Json ReportToJsonWithout(const SimulationReport& report);
+
 } // namespace
 
 Json ReportToJson(const SimulationReport& report) {
+    Json doc = ReportToJsonWithout(report);
+    Json iterations = Json::array();
+    for (const ReportIteration& it : report.fvIterations) {
+        iterations.push_back(Iteration(it, report));
+    }
+    doc["iterations"] = std::move(iterations);
+    return doc;
+}
+
+void WriteJsonReport(std::ostream& out, const SimulationReport& report) {
+    const auto text = [](const Json& value) {
+        return value.dump(2, ' ', false, nlohmann::json::error_handler_t::replace);
+    };
+    // The document with a marker where the iterations go; they are written one by one, each
+    // indented as a member of the array at depth two.
+    const std::string marker = "\\u0001iterations\\u0001";
+    Json doc = ReportToJsonWithout(report);
+    doc["iterations"] = "\x01iterations\x01";
+    const std::string whole = text(doc);
+    const std::size_t at = whole.find('"' + marker + '"');
+    out << whole.substr(0, at);
+    if (report.fvIterations.empty()) {
+        out << "[]";
+    } else {
+        out << "[\n";
+        for (std::size_t i = 0; i < report.fvIterations.size(); ++i) {
+            const std::string one = text(Iteration(report.fvIterations[i], report));
+            std::size_t start = 0;
+            while (start <= one.size()) {
+                const std::size_t end = std::min(one.find('\n', start), one.size());
+                out << "    " << one.substr(start, end - start);
+                if (end == one.size()) {
+                    break;
+                }
+                out << "\n";
+                start = end + 1;
+            }
+            out << (i + 1 < report.fvIterations.size() ? ",\n" : "\n");
+        }
+        out << "  ]";
+    }
+    out << whole.substr(at + marker.size() + 2) << "\n";
+}
+
+namespace {
+
+Json ReportToJsonWithout(const SimulationReport& report) {
     Json doc;
     doc["format"] = "mcsim simulation results";
     doc["version"] = kResultsFormatVersion;
@@ -148,11 +198,7 @@ Json ReportToJson(const SimulationReport& report) {
                            {"tornado_delta_sd", Number(report.fTornadoDelta)},
                            {"contribution_to_variance", report.fbVariance}};
     doc["status"] = report.fbCancelled ? "cancelled" : "completed";
-    Json iterations = Json::array();
-    for (const ReportIteration& it : report.fvIterations) {
-        iterations.push_back(Iteration(it, report));
-    }
-    doc["iterations"] = std::move(iterations);
+    doc["iterations"] = nullptr; // in its place; filled by the callers
     Json warnings = Json::array();
     for (const ReportWarning& w : report.fvWarnings) {
         warnings.push_back(Json{{"code", w.fCode},
@@ -166,5 +212,7 @@ Json ReportToJson(const SimulationReport& report) {
         {"first", report.fFirstModelError.empty() ? Json(nullptr) : Json(report.fFirstModelError)}};
     return doc;
 }
+
+} // namespace
 
 } // namespace MCHost

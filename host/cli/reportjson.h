@@ -9,6 +9,8 @@
 
 #include <nlohmann/json.hpp>
 
+#include <ostream>
+
 namespace MCHost {
 
 //! Version of the document's layout; raised when a key changes meaning or goes away.
@@ -16,5 +18,10 @@ inline constexpr int kResultsFormatVersion = 1;
 
 //! The document of `report`.
 nlohmann::ordered_json ReportToJson(const SimulationReport& report);
+
+//! Writes ReportToJson(report) as text indented by two, one iteration at a time, so that a run
+//! of thousands of sensitivity iterations never holds the whole document in memory. Texts that
+//! are not valid UTF-8 get the replacement character.
+void WriteJsonReport(std::ostream& out, const SimulationReport& report);
 
 } // namespace MCHost

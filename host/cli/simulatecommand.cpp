@@ -316,9 +316,7 @@ bool CommitOutputs(const SimulateOptions& options, const SimulationReport& repor
                    std::ostream& out) {
     if (json) {
         // Texts from the plan that are not valid UTF-8 get the replacement character.
-        json->GetStream() << ReportToJson(report).dump(2, ' ', false,
-                                                       nlohmann::json::error_handler_t::replace)
-                          << "\n";
+        WriteJsonReport(json->GetStream(), report);
     }
     OutputCommitScope commits;
     if (interrupt.IsCancelled()) {

@@ -304,9 +304,9 @@ std::string DescribeSensitivityIteration(const SPCSettings& plan, int iteration)
             return std::string();
         }
         const FixedInputSpecs& fixed = plan.GetFixedInput()[i];
-        std::vector<std::string> texts;
-        fixed.GetInputValue(texts);
-        return k < texts.size() ? fixed.GetVarName() + " = " + texts[k] : std::string();
+        return k < fixed.GetInputValueSize()
+                   ? fixed.GetVarName() + " = " + fixed.GetInputValueAt(k).GetAsString()
+                   : std::string();
     }
     if (i >= plan.GetSimulationInput().size()) {
         return std::string();

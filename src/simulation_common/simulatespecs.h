@@ -323,6 +323,8 @@ public:
     void SetFixedInput(double low, double high, int n);
 
     std::size_t GetInputValueSize() const { return fvInputValues.size(); }
+    //! Value `i` (i < GetInputValueSize()).
+    const MCDataValue& GetInputValueAt(std::size_t i) const { return fvInputValues[i]; }
     //! Appends every value read as a double.
     void GetInputValue(std::vector<double>& values) const;
     //! Appends every value read as a text.

@@ -122,6 +122,11 @@ MCStatus SECAlgorithm::SimulateData(MCXML_800::IMCSPScoreFactory* factory,
     MCStatus status;
     for (int iter = 0; iter == 0 || (iter < fNIterations && !status.IsError()); ++iter) {
         std::unique_ptr<SECSimulator> master = CreateMaster(iter);
+        if (iter > 0) {
+            // An iteration that varies a fixed or categorical input draws its correlated
+            // inputs as the first did: the correlation model is the same.
+            (void)master->AdoptCorrelationModel(*fvSimulators.front());
+        }
         status = RunIteration(*master, factory, sink);
         fWarnings.AddWarnings(master->GetWarnings());
         if (iter == 0) {
@@ -232,6 +237,7 @@ MCStatus SECAlgorithm::RunIteration(SECSimulator& master, MCXML_800::IMCSPScoreF
         if (!status.IsError()) {
             status = master.CompleteStats();
         }
+        master.ReleaseScoreComputer();
         if (cancelled) {
             status = MCStatus(MCSPStatus::kCancelled, false);
         } else if (!status.IsError() && workerStatus.IsError()) {
@@ -249,6 +255,9 @@ MCStatus SECAlgorithm::RunIteration(SECSimulator& master, MCXML_800::IMCSPScoreF
 
 MCStatus SECAlgorithm::CreateHostSimulator(int iter) {
     std::unique_ptr<SECSimulator> simulator = CreateMaster(iter);
+    if (iter > 0 && !fvSimulators.empty() && fvSimulators.front()) {
+        (void)simulator->AdoptCorrelationModel(*fvSimulators.front());
+    }
     MCStatus status = simulator->PrepareForSimulation();
     if (!status.IsError()) {
         status = simulator->PrepareGeneration();

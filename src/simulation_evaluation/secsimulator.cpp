@@ -278,14 +278,12 @@ void SECSimulator::BuildFixedInputs() {
         const std::size_t count = specs.GetInputValueSize();
         if (count > 0) {
             NoteSensitivityInput(input.fName, count);
+            // Only this iteration's value is read: a sensitivity input may have thousands.
             const std::size_t index = count > 1 ? IterationIndex(count) : 0;
-            std::vector<double> numbers;
-            std::vector<std::string> texts;
-            specs.GetInputValue(numbers);
-            specs.GetInputValue(texts);
+            const MCDataValue& value = specs.GetInputValueAt(index);
             input.fbString = specs.IsString();
-            input.fNumber = input.fbString ? MCMV::Missing() : numbers[index];
-            input.fText = texts[index];
+            input.fNumber = input.fbString ? MCMV::Missing() : value.GetAsNumeric();
+            input.fText = value.GetAsString();
         } else {
             input.fNumber = MCMV::Missing();
         }
@@ -509,6 +507,41 @@ MCStatus SECSimulator::PrepareCorrelationModel() {
     fCorrModelStatus = CombineNortaNormalCorrs(workers);
     fbCorrModelPrepared = true;
     return fCorrModelStatus;
+}
+
+bool SECSimulator::AdoptCorrelationModel(const SECSimulator& other) {
+    if (fbCorrModelPrepared || !other.fbCorrModelPrepared || other.fCorrModelStatus.IsError() ||
+        fvCorrelated.size() != other.fvCorrelated.size() ||
+        fbHasTargetCorr != other.fbHasTargetCorr) {
+        return false;
+    }
+    for (std::size_t k = 0; k < fvCorrelated.size(); ++k) {
+        const SECInputGenerator& a = fvCorrelated[k].fGenerator;
+        const SECInputGenerator& b = other.fvCorrelated[k].fGenerator;
+        if (a.fName != b.fName || a.fDistType != b.fDistType || a.fvParams != b.fvParams ||
+            a.fbContinuousEmpirical != b.fbContinuousEmpirical) {
+            return false;
+        }
+    }
+    const int n = fTargetCorr.GetNRows();
+    if (n != other.fTargetCorr.GetNRows()) {
+        return false;
+    }
+    for (int i = 0; i < n; ++i) {
+        for (int j = 0; j <= i; ++j) {
+            const double a = fTargetCorr.GetElem(i, j);
+            const double b = other.fTargetCorr.GetElem(i, j);
+            if (a != b && !(MCMV::IsMissing(a) && MCMV::IsMissing(b))) {
+                return false;
+            }
+        }
+    }
+    fNormalCorr = other.fNormalCorr;
+    fvNortaPairs = other.fvNortaPairs;
+    fbCorrelationFailed = other.fbCorrelationFailed;
+    fCorrModelStatus = other.fCorrModelStatus;
+    fbCorrModelPrepared = true;
+    return true;
 }
 
 MCStatus

@@ -145,6 +145,11 @@ public:
     //! 390015 when the matrix was adjusted and 390017 once per pair whose target lies outside
     //! its attainable range.
     MCCommon_800::MCStatus PrepareCorrelationModel();
+    //! Takes the prepared correlation model of `other` (another sensitivity iteration of the
+    //! same plan) when this simulator's correlated set has the same inputs, distributions and
+    //! target matrix, so that iterations that vary a fixed input or a categorical one do not
+    //! compute it again. False, with nothing taken, otherwise; its warnings stay with `other`.
+    bool AdoptCorrelationModel(const SECSimulator& other);
     //! Resets the case to missing and parameterises the normal generator: one input, a
     //! standard normal; several with a normal matrix, the multivariate normal over it; several
     //! without R, independent normals. Prepares the correlation model first when R exists and
@@ -200,6 +205,9 @@ public:
     //! Obtains this simulator's score computer from `factory` and records its model type in the
     //! results. Null `factory`: nothing happens.
     MCCommon_800::MCStatus CreateScoreComputer(MCXML_800::IMCSPScoreFactory* factory);
+    //! Gives the score computer back once the iteration's results are complete: a run of
+    //! thousands of sensitivity iterations keeps their results, not a model instance each.
+    void ReleaseScoreComputer() { fpScoreComputer.reset(); }
     //! PrepareGeneration, StartScoring and ProcessTargetInfo, as every simulator that scores
     //! does before its first case.
     MCCommon_800::MCStatus PrepareScoring();

@@ -204,6 +204,15 @@ TEST(SimulationReport, JsonCarriesTheResultsWithNullForMissing) {
     EXPECT_NE(text.str().find("[-0.300, 0.450]        1.0000      0.480  unreachable"),
               std::string::npos)
         << text.str();
+
+    // The streamed document is the whole one, with none, one and two iterations.
+    for (const std::size_t n : {0u, 1u, 2u}) {
+        report.fvIterations.resize(n, report.fvIterations.empty() ? ReportIteration()
+                                                                   : report.fvIterations[0]);
+        std::ostringstream streamed;
+        WriteJsonReport(streamed, report);
+        EXPECT_EQ(streamed.str(), ReportToJson(report).dump(2) + "\n") << n;
+    }
 }
 
 } // namespace
