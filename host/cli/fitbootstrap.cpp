@@ -89,24 +89,24 @@ public:
         fbDone = true;
     }
 
-    bool fbDone = false;                   //!< the refit gave an estimate
-    std::vector<double> fvParams;          //!< its parameters
-    double fStatistic = MCMV::Missing();   //!< its statistic
+    bool fbDone = false;                 //!< the refit gave an estimate
+    std::vector<double> fvParams;        //!< its parameters
+    double fStatistic = MCMV::Missing(); //!< its statistic
 
 private:
-    DistType fType;                        //!< the candidate
-    MeasureLevel fLevel;                   //!< the field's level
-    GoodFitType fGFType;                   //!< the configured statistic
-    const std::vector<double>* fpParams;   //!< the fitted parameters, not owned
-    std::int64_t fN;                       //!< sample size
-    std::uint64_t fSeed;                   //!< the stream's seed
+    DistType fType;                           //!< the candidate
+    MeasureLevel fLevel;                      //!< the field's level
+    GoodFitType fGFType;                      //!< the configured statistic
+    const std::vector<double>* fpParams;      //!< the fitted parameters, not owned
+    std::int64_t fN;                          //!< sample size
+    std::uint64_t fSeed;                      //!< the stream's seed
     const std::function<bool()>* fpCancelled; //!< interrupt query, not owned
 };
 
 //! The replicates of one candidate.
 struct CandidateRun {
     std::size_t fCovariate;                              //!< covariate position
-    const DFCOutputStats::DFCVarDistElement* fpElement; //!< the fitted candidate
+    const DFCOutputStats::DFCVarDistElement* fpElement;  //!< the fitted candidate
     std::vector<std::unique_ptr<ReplicateTask>> fvTasks; //!< its replicates
 };
 
@@ -188,8 +188,7 @@ std::vector<FitBootstrap> RunFitBootstrap(const DFCOutputStats& results,
             continue;
         }
         for (const DFCOutputStats::DFCVarDistElement& e : info.fDistElements) {
-            const MCMCSP_800::MCSPDistFamily* family =
-                MCMCSP_800::MCSPFindDistFamily(e.fDistType);
+            const MCMCSP_800::MCSPDistFamily* family = MCMCSP_800::MCSPFindDistFamily(e.fDistType);
             if (!e.fbDistAllowed || !family || !family->HasDensity(e.fDistParams)) {
                 continue;
             }

@@ -20,11 +20,11 @@ namespace MCHost {
 
 //! What a bootstrap run needs besides the results.
 struct FitBootstrapRequest {
-    int fReplicates = 0;        //!< N refits per candidate
-    std::uint32_t fSeed = 0;    //!< seed of every stream
-    std::int64_t fSampleSize = 0; //!< values per drawn sample (the rows the fit used)
-    int fThreads = 1;           //!< worker threads
-    double fLevel = 0.95;       //!< level of the percentile intervals
+    int fReplicates = 0;              //!< N refits per candidate
+    std::uint32_t fSeed = 0;          //!< seed of every stream
+    std::int64_t fSampleSize = 0;     //!< values per drawn sample (the rows the fit used)
+    int fThreads = 1;                 //!< worker threads
+    double fLevel = 0.95;             //!< level of the percentile intervals
     std::function<bool()> fCancelled; //!< true once the user interrupts (may be empty)
 };
 

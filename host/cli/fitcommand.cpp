@@ -750,9 +750,9 @@ void CheckFitOptions(const FitOptions& options) {
     static_cast<void>(ParseFixed(options.fvFixed));
     static_cast<void>(ParseFamilyFilter(options.fvFamilies, options.fvExclude));
     // A rule by an EDF statistic needs that statistic computed.
-    for (const auto& [option, text] : {std::pair<std::string, const std::string*>{"--choose",
-                                                                                 &options.fChoose},
-                                       {"--rank", &options.fRank}}) {
+    for (const auto& [option, text] :
+         {std::pair<std::string, const std::string*>{"--choose", &options.fChoose},
+          {"--rank", &options.fRank}}) {
         const FitRule rule = ParseFitRule(*text, option);
         if ((rule == FitRule::kAD && options.fTest == "ks") ||
             (rule == FitRule::kKS && options.fTest == "ad")) {
@@ -798,9 +798,8 @@ DataDictionary ReadDictionary(const FitOptions& options, const CsvLayout& layout
 //! nothing written, when an interrupt came before the files were put in place.
 bool WriteOutputs(const FitOptions& options, const DataDictionary& dict,
                   const std::vector<std::string>& fields, const DFCOutputStats& results,
-                  const DFCOutputStats& chosen, const std::string& json,
-                  const FormulaModel* model, InterruptWatcher& interrupt, std::ostream& out,
-                  std::ostream& err) {
+                  const DFCOutputStats& chosen, const std::string& json, const FormulaModel* model,
+                  InterruptWatcher& interrupt, std::ostream& out, std::ostream& err) {
     MCMCSP_800::MCPlanXMLHandler handler;
     std::string planXml;
     if (!options.fPlanPath.empty()) {
@@ -1083,13 +1082,14 @@ int RunFit(const FitOptions& options, std::ostream& out, std::ostream& err) {
         run.fvDecisions =
             ApplyFitChoice(chosen, run.fChoose, run.fEmpiricalBelow, settings.GetGFType());
         RankReported(chosen, rank);
-        const std::uint32_t seed = options.fSeed < 0 ? kDefaultBootstrapSeed
-                                                     : static_cast<std::uint32_t>(options.fSeed);
+        const std::uint32_t seed =
+            options.fSeed < 0 ? kDefaultBootstrapSeed : static_cast<std::uint32_t>(options.fSeed);
         if (options.fBootstrap > 0) {
             FitBootstrapRequest request;
             request.fReplicates = options.fBootstrap;
             request.fSeed = seed;
-            request.fSampleSize = static_cast<std::int64_t>(std::llround(algorithm.GetValidWeight()));
+            request.fSampleSize =
+                static_cast<std::int64_t>(std::llround(algorithm.GetValidWeight()));
             request.fThreads = settings.GetMaxThreadNum();
             request.fLevel = kBootstrapLevel;
             request.fCancelled = [&interrupt] { return interrupt.IsCancelled(); };

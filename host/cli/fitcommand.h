@@ -34,13 +34,13 @@ struct FitOptions {
     //! Megabytes of the data kept in memory after the first reading for the fitting's passes
     //! (0: the file is read again for every pass).
     std::uint64_t fCacheMegabytes = 256;
-    bool fbProgress = true;             //!< progress bar when stderr is a terminal
-    std::string fPlanPath;              //!< -o: the plan file to write, "" none
-    std::string fFitStatsPath;          //!< --fit-stats: the statistics document, "" none
-    std::string fModelPath;             //!< --model: the formula model to record
-    std::vector<std::string> fvTargets; //!< --targets: the model targets to record
-    std::vector<std::string> fvFixed;   //!< --fixed NAME=VALUE: fixed inputs of the plan
-    std::string fJsonPath;              //!< --json: the results document, "" none
+    bool fbProgress = true;              //!< progress bar when stderr is a terminal
+    std::string fPlanPath;               //!< -o: the plan file to write, "" none
+    std::string fFitStatsPath;           //!< --fit-stats: the statistics document, "" none
+    std::string fModelPath;              //!< --model: the formula model to record
+    std::vector<std::string> fvTargets;  //!< --targets: the model targets to record
+    std::vector<std::string> fvFixed;    //!< --fixed NAME=VALUE: fixed inputs of the plan
+    std::string fJsonPath;               //!< --json: the results document, "" none
     std::vector<std::string> fvFamilies; //!< --families [FIELD=]Family,...: candidates kept
     std::vector<std::string> fvExclude;  //!< --exclude [FIELD=]Family,...: candidates left out
     std::string fChoose;                 //!< --choose ad|ks|aic|bic, "" the component's rule

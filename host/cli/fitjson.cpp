@@ -34,7 +34,9 @@ Json Numbers(const std::vector<double>& values) {
     return list;
 }
 
-Json Text(const std::string& text) { return text.empty() ? Json(nullptr) : Json(text); }
+Json Text(const std::string& text) {
+    return text.empty() ? Json(nullptr) : Json(text);
+}
 
 double At(const std::vector<double>& v, std::size_t i) {
     return i < v.size() ? v[i] : MCMV::Missing();
@@ -51,8 +53,8 @@ Json Parameters(const Element& e, const FitBootstrap* boot) {
         p["name"] = names[i];
         const bool tail = i + 1 == names.size() && values.size() > names.size();
         if (tail) {
-            p["value"] = Numbers(std::vector<double>(values.begin() + static_cast<long>(i),
-                                                     values.end()));
+            p["value"] =
+                Numbers(std::vector<double>(values.begin() + static_cast<long>(i), values.end()));
             list.push_back(std::move(p));
             break;
         }
@@ -74,9 +76,9 @@ Json Correlations(const Element& e) {
     }
     Json rows = Json::array();
     for (std::size_t i = 0; i < k; ++i) {
-        rows.push_back(Numbers(std::vector<double>(
-            e.fvParamCorrelations.begin() + static_cast<long>(i * k),
-            e.fvParamCorrelations.begin() + static_cast<long>((i + 1) * k))));
+        rows.push_back(Numbers(
+            std::vector<double>(e.fvParamCorrelations.begin() + static_cast<long>(i * k),
+                                e.fvParamCorrelations.begin() + static_cast<long>((i + 1) * k))));
     }
     return rows;
 }
@@ -85,9 +87,9 @@ Json Edf(double stat, double modified, double p, double lower, double upper, dou
     if (MCMV::IsMissing(stat)) {
         return Json(nullptr);
     }
-    return Json{{"value", Number(stat)},     {"modified", Number(modified)},
-                {"p_value", Number(p)},      {"p_lower", Number(lower)},
-                {"p_upper", Number(upper)},  {"bootstrap_p_value", Number(bootP)}};
+    return Json{{"value", Number(stat)},    {"modified", Number(modified)},
+                {"p_value", Number(p)},     {"p_lower", Number(lower)},
+                {"p_upper", Number(upper)}, {"bootstrap_p_value", Number(bootP)}};
 }
 
 Json Statistics(const Element& e, const FitBootstrap* boot, GoodFitType gfType) {
@@ -103,10 +105,9 @@ Json Statistics(const Element& e, const FitBootstrap* boot, GoodFitType gfType) 
     } else {
         stats["chi_square"] = Json{{"value", Number(e.fChiSquareFit)},
                                    {"p_value", Number(e.fChiSquarePValue)},
-                                   {"pooled",
-                                    Json{{"value", Number(e.fChiSquarePooled)},
-                                         {"df", Number(e.fChiSquarePooledDF)},
-                                         {"p_value", Number(e.fChiSquarePooledPValue)}}}};
+                                   {"pooled", Json{{"value", Number(e.fChiSquarePooled)},
+                                                   {"df", Number(e.fChiSquarePooledDF)},
+                                                   {"p_value", Number(e.fChiSquarePooledPValue)}}}};
     }
     return stats;
 }
@@ -133,8 +134,8 @@ Json Candidate(const Element& e, int rank, const FitBootstrap* boot, GoodFitType
     c["parameter_correlations"] = Correlations(e);
     c["statistics"] = Statistics(e, boot, gfType);
     c["log_likelihood"] = Number(e.fLogLikelihood);
-    c["estimated_parameters"] = e.fDistType == kDistEmpirical ? Json(nullptr)
-                                                              : Json(e.fNEstimatedParams);
+    c["estimated_parameters"] =
+        e.fDistType == kDistEmpirical ? Json(nullptr) : Json(e.fNEstimatedParams);
     c["aic"] = Number(e.fAIC);
     c["bic"] = Number(e.fBIC);
     c["aicc"] = Number(e.fAICc);
@@ -144,8 +145,7 @@ Json Candidate(const Element& e, int rank, const FitBootstrap* boot, GoodFitType
     return c;
 }
 
-const FitBootstrap* FindBootstrap(const FitJsonRun& run, const std::string& field,
-                                  DistType type) {
+const FitBootstrap* FindBootstrap(const FitJsonRun& run, const std::string& field, DistType type) {
     for (const FitBootstrap& b : run.fvBootstraps) {
         if (b.fField == field && b.fType == type) {
             return &b;
@@ -169,8 +169,8 @@ Json Candidates(const Info& info, const FitJsonRun& run, GoodFitType gfType,
         // The component's reported copies are taken before the last results are filled in;
         // the candidate's own element is the whole one.
         const Element& whole = k < info.fDistElements.size() ? info.fDistElements[k] : e;
-        list.push_back(Candidate(whole, ++rank,
-                                 FindBootstrap(run, info.fFittedVarName, e.fDistType), gfType));
+        list.push_back(
+            Candidate(whole, ++rank, FindBootstrap(run, info.fFittedVarName, e.fDistType), gfType));
     }
     for (bool dropped : {false, true}) {
         for (const Element& e : info.fDistElements) {
@@ -180,8 +180,8 @@ Json Candidates(const Info& info, const FitJsonRun& run, GoodFitType gfType,
                 e.fbDistAllowed == dropped) {
                 continue;
             }
-            list.push_back(Candidate(e, 0, FindBootstrap(run, info.fFittedVarName, e.fDistType),
-                                     gfType));
+            list.push_back(
+                Candidate(e, 0, FindBootstrap(run, info.fFittedVarName, e.fDistType), gfType));
         }
     }
     return list;
@@ -250,14 +250,13 @@ Json FitResultsToJson(const FitJsonRun& run, const DFCOutputStats& results,
     const auto ruleKey = [](FitRule r) {
         return r == FitRule::kComponent ? Json(nullptr) : Json(FitRuleName(r));
     };
-    doc["settings"] = Json{{"test", run.fTest},
-                           {"choose", ruleKey(run.fChoose)},
-                           {"rank", ruleKey(run.fRank)},
-                           {"empirical_below", Number(run.fEmpiricalBelow)},
-                           {"bootstrap", run.fBootstrapReplicates},
-                           {"seed", run.fBootstrapReplicates > 0 && run.fSeed >= 0
-                                        ? Json(run.fSeed)
-                                        : Json(nullptr)}};
+    doc["settings"] = Json{
+        {"test", run.fTest},
+        {"choose", ruleKey(run.fChoose)},
+        {"rank", ruleKey(run.fRank)},
+        {"empirical_below", Number(run.fEmpiricalBelow)},
+        {"bootstrap", run.fBootstrapReplicates},
+        {"seed", run.fBootstrapReplicates > 0 && run.fSeed >= 0 ? Json(run.fSeed) : Json(nullptr)}};
     std::vector<double> positions;
     for (int i = 1; i <= 99; ++i) {
         positions.push_back(i / 100.0);

@@ -23,30 +23,30 @@ inline constexpr int kFitResultsFormatVersion = 1;
 
 //! Percentile intervals of a parametric bootstrap of one candidate.
 struct FitBootstrap {
-    std::string fField;                            //!< the field
-    MCSPConst::DistType fType;                     //!< the candidate
-    int fReplicates = 0;                           //!< refits that gave an estimate
-    double fLevel = 0.95;                          //!< interval level
-    std::vector<double> fvLower;                   //!< per parameter, lower percentile
-    std::vector<double> fvUpper;                   //!< per parameter, upper percentile
+    std::string fField;                             //!< the field
+    MCSPConst::DistType fType;                      //!< the candidate
+    int fReplicates = 0;                            //!< refits that gave an estimate
+    double fLevel = 0.95;                           //!< interval level
+    std::vector<double> fvLower;                    //!< per parameter, lower percentile
+    std::vector<double> fvUpper;                    //!< per parameter, upper percentile
     double fPValue = MCCommon_800::MCMV::Missing(); //!< bootstrap p-value of the statistic
 };
 
 //! What the document says about the run besides the component's results.
 struct FitJsonRun {
-    std::string fDataPath;                //!< the CSV file
-    std::int64_t fRowsRead = 0;           //!< rows read
-    std::int64_t fRowsUsed = 0;           //!< rows with a value in every fitted field
-    double fTotalWeight = 0.0;            //!< W (the rows used without a weight field)
-    std::string fWeightField;             //!< "" none
-    std::string fTest;                    //!< ad, ks or both
+    std::string fDataPath;                 //!< the CSV file
+    std::int64_t fRowsRead = 0;            //!< rows read
+    std::int64_t fRowsUsed = 0;            //!< rows with a value in every fitted field
+    double fTotalWeight = 0.0;             //!< W (the rows used without a weight field)
+    std::string fWeightField;              //!< "" none
+    std::string fTest;                     //!< ad, ks or both
     FitRule fChoose = FitRule::kComponent; //!< --choose
     FitRule fRank = FitRule::kComponent;   //!< --rank
     double fEmpiricalBelow = MCCommon_800::MCMV::Missing(); //!< --empirical-below, missing off
-    std::vector<FitDecision> fvDecisions;                     //!< one per covariate
-    std::vector<FitBootstrap> fvBootstraps;                   //!< --bootstrap results
-    std::int64_t fSeed = -1;                                  //!< --seed with --bootstrap
-    int fBootstrapReplicates = 0;                             //!< --bootstrap N, 0 off
+    std::vector<FitDecision> fvDecisions;                   //!< one per covariate
+    std::vector<FitBootstrap> fvBootstraps;                 //!< --bootstrap results
+    std::int64_t fSeed = -1;                                //!< --seed with --bootstrap
+    int fBootstrapReplicates = 0;                           //!< --bootstrap N, 0 off
 };
 
 //! The document of `results` (the choices of `run` already applied) with the run's `warnings`.
@@ -56,7 +56,6 @@ nlohmann::ordered_json FitResultsToJson(const FitJsonRun& run,
 
 //! The parameter names as reports show them: the plan calls the Gamma's second parameter and
 //! the Exponential's parameter "scale", but both are rates (mean k/β and 1/θ).
-std::vector<std::string> ReportParamNames(MCSPConst::DistType type,
-                                          std::vector<std::string> names);
+std::vector<std::string> ReportParamNames(MCSPConst::DistType type, std::vector<std::string> names);
 
 } // namespace MCHost

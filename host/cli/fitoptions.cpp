@@ -30,8 +30,9 @@ DistType ParseFamily(const std::string& name, const std::string& option) {
     const std::string wanted = Lower(name);
     for (int t = kDistBinomial; t <= kDistExponential; ++t) {
         const auto type = static_cast<DistType>(t);
-        if (type != kDistCategorical && (Lower(MCMCSP_800::DistType2String(type)) == wanted ||
-                                         Lower(MCMCSP_800::GetDistTypeDisplayWord(type)) == wanted)) {
+        if (type != kDistCategorical &&
+            (Lower(MCMCSP_800::DistType2String(type)) == wanted ||
+             Lower(MCMCSP_800::GetDistTypeDisplayWord(type)) == wanted)) {
             return type;
         }
     }
@@ -71,7 +72,8 @@ double RuleValue(const Element& e, FitRule rule, MeasureLevel level, GoodFitType
     if (level != kLevelContinuous) {
         return e.fChiSquareFit;
     }
-    const bool ks = rule == FitRule::kKS || (rule == FitRule::kComponent && gfType == kKolmogorovSmirnov);
+    const bool ks =
+        rule == FitRule::kKS || (rule == FitRule::kComponent && gfType == kKolmogorovSmirnov);
     return ks ? e.fKSFit : e.fADFit;
 }
 
@@ -137,9 +139,9 @@ FitDecision ChooseByRule(Info& info, FitRule rule, GoodFitType gfType) {
     const bool own = rule == FitRule::kComponent ||
                      (!continuous && (rule == FitRule::kAD || rule == FitRule::kKS));
     if (own) {
-        d.fRule = continuous ? FitRuleName(gfType == kKolmogorovSmirnov ? FitRule::kKS
-                                                                         : FitRule::kAD)
-                             : std::string("chi-square");
+        d.fRule = continuous
+                      ? FitRuleName(gfType == kKolmogorovSmirnov ? FitRule::kKS : FitRule::kAD)
+                      : std::string("chi-square");
         d.fRule += rule == FitRule::kComponent ? " (the component's rule)"
                                                : " (count fields are chosen by chi-square)";
         d.fType = info.fDistBestType;

@@ -18,10 +18,10 @@ namespace MCMCSP_800 {
 
 //! A weighted sample in ascending order: value(i) and weight(i) for i < n, total weight W.
 struct DFCSortedSample {
-    std::size_t fN = 0;                          //!< number of entries
-    std::function<double(std::size_t)> fValue;   //!< the i-th smallest value
-    std::function<double(std::size_t)> fWeight;  //!< its weight
-    double fTotalWeight = 0.0;                   //!< W = Σ weight(i)
+    std::size_t fN = 0;                         //!< number of entries
+    std::function<double(std::size_t)> fValue;  //!< the i-th smallest value
+    std::function<double(std::size_t)> fWeight; //!< its weight
+    double fTotalWeight = 0.0;                  //!< W = Σ weight(i)
 };
 
 //! Which entries of `params` of candidate `type` the fitting estimates by maximum likelihood at

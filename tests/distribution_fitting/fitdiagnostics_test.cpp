@@ -155,8 +155,8 @@ TEST(SampleQuantiles, InverseOfTheWeightedEdf) {
     const auto weighted = quantiles({1, 2, 3}, {2, 1, 3});
     const auto repeated = quantiles({1, 1, 2, 3, 3, 3}, {1, 1, 1, 1, 1, 1});
     EXPECT_EQ(weighted, repeated);
-    EXPECT_EQ(weighted.first[32], 1.0);  // p = 0.33 ≤ 2/6
-    EXPECT_EQ(weighted.first[33], 2.0);  // p = 0.34
+    EXPECT_EQ(weighted.first[32], 1.0); // p = 0.33 ≤ 2/6
+    EXPECT_EQ(weighted.first[33], 2.0); // p = 0.34
     EXPECT_NEAR_REL(weighted.second[33], 0.5, 1e-15);
     std::vector<double> hundred;
     for (int i = 1; i <= 100; ++i) {

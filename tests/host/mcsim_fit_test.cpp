@@ -269,12 +269,14 @@ INSTANTIATE_TEST_SUITE_P(
                "p.xml: this file is written by -o already",
                "",
                2},
-        BadRun{"UnknownFamily", "", {"--families", "unit_price=Gauss"}, "unknown family 'Gauss'",
-               "", 2},
-        BadRun{"UnknownRule", "", {"--choose", "lnl"}, "--choose lnl: expected ad, ks, aic", "",
+        BadRun{"UnknownFamily",
+               "",
+               {"--families", "unit_price=Gauss"},
+               "unknown family 'Gauss'",
+               "",
                2},
-        BadRun{"RuleWithoutItsStatistic", "", {"--rank", "ks"}, "--rank ks needs --test ks", "",
-               2},
+        BadRun{"UnknownRule", "", {"--choose", "lnl"}, "--choose lnl: expected ad, ks, aic", "", 2},
+        BadRun{"RuleWithoutItsStatistic", "", {"--rank", "ks"}, "--rank ks needs --test ks", "", 2},
         BadRun{"FilterOfAnUnfittedField",
                "",
                {"--fields", "unit_price", "--exclude", "volume=Normal"},
@@ -377,8 +379,8 @@ TEST(McsimFit, ReportsDiagnosticsAndDropReasons) {
 // and the bootstrap gives the same document with one thread or two.
 TEST(McsimFit, JsonChoicesAndBootstrap) {
     hosttest::TempDir dir;
-    const std::string data = std::string(MCSIM_EXAMPLES_DIR) +
-                             "/../tests/distribution_fitting/data/gof_nile.csv";
+    const std::string data =
+        std::string(MCSIM_EXAMPLES_DIR) + "/../tests/distribution_fitting/data/gof_nile.csv";
     const auto fit = [&](const std::vector<std::string>& extra, const std::string& json) {
         std::vector<std::string> args = {"fit", data, "--json", dir.File(json)};
         args.insert(args.end(), extra.begin(), extra.end());
