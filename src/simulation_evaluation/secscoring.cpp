@@ -339,7 +339,7 @@ MCStatus SECSimulator::FinishTargetSetup() {
     fpCatInfo = &cat;
     fProvMeans = MCMath_800::MCProvMeans(static_cast<int>(nCorrelated + fvTargets.size()), true);
     fvCombined.assign(nCorrelated + fvTargets.size(), MCMV::Missing());
-    fvScoreValues.assign(static_cast<std::size_t>(fNValuesPerCase), MCMV::Missing());
+    fCase.fvValues.assign(static_cast<std::size_t>(fNValuesPerCase), MCMV::Missing());
     fvCellCounts.assign(fbHasCrosstab ? fCrosstab.fvCumTable.size() - 1 : 0, 0.0);
     fSimCaseCount = fFilteredCaseCount = fValidCaseCount = fInvalidCaseCount = 0;
     fbStopped = false;
@@ -425,7 +425,8 @@ void SECSimulator::SetupStopCriteria() {
 
 // ---- Scoring ----------------------------------------------------------------------------------
 
-MCStatus SECSimulator::ScoreInputs(const std::vector<double>& inputs) {
+MCStatus SECSimulator::ScoreInputs(const std::vector<double>& inputs,
+                                   std::vector<double>& values) {
     // Numeric inputs as numbers; a categorical input as its category: the label for a string
     // variable, the category's number otherwise.
     for (std::size_t i = 0; i < fvSimInputs.size(); ++i) {
@@ -456,17 +457,17 @@ MCStatus SECSimulator::ScoreInputs(const std::vector<double>& inputs) {
     ++fScoreCount;
     const MCStatus status = fpScoreComputer->ScoreRecord(fInputRecord, fOutputRecord);
     if (status.IsError()) {
-        std::fill(fvScoreValues.begin(), fvScoreValues.end(), MCMV::Missing());
+        std::fill(values.begin(), values.end(), MCMV::Missing());
         return status;
     }
-    ReadScore();
+    ReadScore(values);
     return status;
 }
 
-void SECSimulator::ReadScore() {
+void SECSimulator::ReadScore(std::vector<double>& values) {
     if (fPredictedIndex < 0) {
         for (int i = 0; i < fNValuesPerCase; ++i) {
-            fvScoreValues[static_cast<std::size_t>(i)] = fOutputRecord[i].GetReal();
+            values[static_cast<std::size_t>(i)] = fOutputRecord[i].GetReal();
         }
         return;
     }
@@ -483,12 +484,12 @@ void SECSimulator::ReadScore() {
     } else {
         value = prediction.GetReal();
     }
-    fvScoreValues[0] = value;
+    values[0] = value;
     if (target.fNProbs > 0) {
         const Value& probs = fOutputRecord[fProbIndex];
         const bool isList = probs.GetType() == Value::kList;
         for (int k = 0; k < target.fNProbs; ++k) {
-            fvScoreValues[static_cast<std::size_t>(1 + k)] =
+            values[static_cast<std::size_t>(1 + k)] =
                 isList ? probs.GetListValue(target.fvLabels[static_cast<std::size_t>(k)])
                        : MCMV::Missing();
         }
@@ -514,7 +515,7 @@ bool SECSimulator::AreTargetsAccepted(const std::vector<double>& values) const {
 }
 
 MCStatus SECSimulator::DrawAndScoreCase() {
-    return DrawAcceptedCase(true);
+    return DrawAcceptedCase(fCase, fRandomValues, *fpStream, true);
 }
 
 // ---- Chart ranges -----------------------------------------------------------------------------
@@ -645,7 +646,7 @@ MCStatus SECSimulator::RunPilot() {
         if (status.IsError()) {
             continue;
         }
-        UpdateRangeStats(fvCaseValues, fvScoreValues, inputStats, targetStats);
+        UpdateRangeStats(fCase.fvInputs, fCase.fvValues, inputStats, targetStats);
         ++valid;
     }
     if (valid < kPilotValid) {
@@ -663,9 +664,9 @@ void SECSimulator::AccumulateCase() {
     if (UsesSensitivity()) {
         AccumulateSensitivity();
     }
-    AccumulateValues(fvCaseValues, fvScoreValues, fCrosstabCell, fLastRejections);
+    AccumulateValues(fCase.fvInputs, fCase.fvValues, fCase.fCell, fCase.fRejections);
     if (fbAddedResults) {
-        AccumulateAddedResults(fvCaseValues, fvScoreValues, true);
+        AccumulateAddedResults(fCase.fvInputs, fCase.fvValues, true);
     }
 }
 
@@ -819,7 +820,7 @@ MCStatus SECSimulator::UpdateStatsForRecord(const std::vector<double>& predictor
         ++fSimCaseCount;
         ++fFilteredCaseCount;
     } else {
-        AccumulateValues(predictors, targets, fCrosstabCell, fLastRejections);
+        AccumulateValues(predictors, targets, fCase.fCell, fCase.fRejections);
         if (fbAddedResults) {
             AccumulateAddedResults(predictors, targets, false);
         }
@@ -836,11 +837,11 @@ void SECSimulator::SetSink(MCXML_800::SECAppDataProcess* sink, MCThread_800::IMC
 
 void SECSimulator::PassCaseToSink() {
     if (fpLock == nullptr) {
-        fpSink->AddCase(fvCaseValues, fvScoreValues, fIteration);
+        fpSink->AddCase(fCase.fvInputs, fCase.fvValues, fIteration);
         return;
     }
-    fvSinkInputs.insert(fvSinkInputs.end(), fvCaseValues.begin(), fvCaseValues.end());
-    fvSinkValues.insert(fvSinkValues.end(), fvScoreValues.begin(), fvScoreValues.end());
+    fvSinkInputs.insert(fvSinkInputs.end(), fCase.fvInputs.begin(), fCase.fvInputs.end());
+    fvSinkValues.insert(fvSinkValues.end(), fCase.fvValues.begin(), fCase.fvValues.end());
     if (++fSinkCount >= kSinkBatch) {
         FlushSink();
     }
@@ -850,7 +851,7 @@ void SECSimulator::FlushSink() {
     if (fpSink == nullptr || fpLock == nullptr || fSinkCount == 0) {
         return;
     }
-    const std::size_t nInputs = fvCaseValues.size();
+    const std::size_t nInputs = fCase.fvInputs.size();
     const auto nValues = static_cast<std::size_t>(fNValuesPerCase);
     std::vector<double> inputs(nInputs);
     std::vector<double> values(nValues);
@@ -893,7 +894,7 @@ MCStatus SECSimulator::RunCaseLoop() {
         if (status.IsError()) {
             // One failed case does not end the run.
             ++fSimCaseCount;
-            fFilteredCaseCount += fLastRejections;
+            fFilteredCaseCount += fCase.fRejections;
             ++fInvalidCaseCount;
         } else {
             AccumulateCase();

@@ -60,10 +60,10 @@ void SECSimulator::PrepareSensitivity() {
     fvPosDiff.assign(cells, MCMV::Missing());
     fvNegDiff.assign(cells, MCMV::Missing());
     fvProducts.assign(cells, MCMV::Missing());
-    fvSavedInputs.assign(fvSimInputs.size(), MCMV::Missing());
-    fvSavedValues.assign(static_cast<std::size_t>(fNValuesPerCase), MCMV::Missing());
     fvWorkInputs.assign(fvSimInputs.size(), MCMV::Missing());
-    fvFurther.assign(fvSimInputs.size(), MCMV::Missing());
+    fvWorkValues.assign(static_cast<std::size_t>(fNValuesPerCase), MCMV::Missing());
+    fFurther.Reset(fvSimInputs.size(), fvCorrelated.size());
+    fFurther.fvValues.assign(static_cast<std::size_t>(fNValuesPerCase), MCMV::Missing());
     for (SECContinuousTargetInfo& info : fpOutputStats->GetContTargetInfo()) {
         info.fvPositiveDelta.assign(nCovariates, MCMV::Missing());
         info.fvNegativeDelta.assign(nCovariates, MCMV::Missing());
@@ -85,36 +85,19 @@ bool SECSimulator::DrawFurtherCase() {
         fFurtherValues = fRandomValues;
         fFurtherValues.SetURNGPtr(fpFurtherStream.get());
     }
-    // The draw runs on the further stream and generator in place of the base ones; the base
-    // case's cell, rejection count and normal scores are put back afterwards.
-    const int savedCell = fCrosstabCell;
-    const int savedRejections = fLastRejections;
-    fvSavedZ = fvZ;
-    MCMath_800::MCURandom* base = fpStream;
-    fpStream = fpFurtherStream.get();
-    std::swap(fRandomValues, fFurtherValues);
-    const MCStatus drawn = DrawAndScoreCase();
-    std::swap(fRandomValues, fFurtherValues);
-    fpStream = base;
-    fvFurther = fvCaseValues;
-    fvZ = fvSavedZ;
-    fCrosstabCell = savedCell;
-    fLastRejections = savedRejections;
-    return !drawn.IsError();
+    return !DrawAcceptedCase(fFurther, fFurtherValues, *fpFurtherStream, true).IsError();
 }
 
 void SECSimulator::ComputeCaseSensitivity() {
     const std::size_t nCovariates = fvCorrelated.size();
     const std::size_t nTargets = fvContTargetPos.size();
-    fvSavedInputs = fvCaseValues;
-    fvSavedValues = fvScoreValues;
+    const std::vector<double>& base = fCase.fvValues;
     // Differences of every continuous target from the case's own score; missing (skipped)
     // when the variant could not be scored.
     const auto record = [&](std::vector<double>& table, std::size_t k, bool scored) {
         for (std::size_t t = 0; t < nTargets; ++t) {
             const auto pos = static_cast<std::size_t>(fvContTargetPos[t]);
-            table[t * nCovariates + k] =
-                scored ? fvScoreValues[pos] - fvSavedValues[pos] : MCMV::Missing();
+            table[t * nCovariates + k] = scored ? fvWorkValues[pos] - base[pos] : MCMV::Missing();
         }
     };
     // A shifted value outside the input's natural range is no value of its distribution (a
@@ -126,18 +109,18 @@ void SECSimulator::ComputeCaseSensitivity() {
             return false;
         }
         fvWorkInputs[static_cast<std::size_t>(fvCorrelated[k].fCasePos)] = value;
-        return !ScoreInputs(fvWorkInputs).IsError();
+        return !ScoreInputs(fvWorkInputs, fvWorkValues).IsError();
     };
 
+    fvWorkInputs = fCase.fvInputs;
     if (fbDeltaMeasure) {
-        fvWorkInputs = fvSavedInputs;
         for (std::size_t k = 0; k < nCovariates; ++k) {
             const double delta = fvCorrelated[k].fTornadoDelta;
             if (MCMV::IsMissing(delta) || !(delta > 0.0)) {
                 continue;
             }
             const auto pos = static_cast<std::size_t>(fvCorrelated[k].fCasePos);
-            const double saved = fvSavedInputs[pos];
+            const double saved = fCase.fvInputs[pos];
             record(fvPosDiff, k, scoreShifted(k, saved + delta));
             record(fvNegDiff, k, scoreShifted(k, saved - delta));
             fvWorkInputs[pos] = saved;
@@ -146,26 +129,22 @@ void SECSimulator::ComputeCaseSensitivity() {
 
     if (fbVarianceMeasure) {
         const bool further = DrawFurtherCase();
-        fvWorkInputs = fvSavedInputs;
         for (std::size_t k = 0; k < nCovariates; ++k) {
             if (!fvCorrelated[k].fbVarianceContrib) {
                 continue;
             }
             const auto pos = static_cast<std::size_t>(fvCorrelated[k].fCasePos);
-            fvWorkInputs[pos] = fvFurther[pos];
-            const bool scored = further && !ScoreInputs(fvWorkInputs).IsError();
+            fvWorkInputs[pos] = fFurther.fvInputs[pos];
+            const bool scored = further && !ScoreInputs(fvWorkInputs, fvWorkValues).IsError();
             for (std::size_t t = 0; t < nTargets; ++t) {
                 const auto tpos = static_cast<std::size_t>(fvContTargetPos[t]);
                 const double c = fvContCentre[t];
                 fvProducts[t * nCovariates + k] =
-                    scored ? (fvSavedValues[tpos] - c) * (fvScoreValues[tpos] - c)
-                           : MCMV::Missing();
+                    scored ? (base[tpos] - c) * (fvWorkValues[tpos] - c) : MCMV::Missing();
             }
-            fvWorkInputs[pos] = fvSavedInputs[pos];
+            fvWorkInputs[pos] = fCase.fvInputs[pos];
         }
     }
-    fvCaseValues = fvSavedInputs;
-    fvScoreValues = fvSavedValues;
 }
 
 void SECSimulator::AccumulateSensitivity() {
@@ -291,7 +270,7 @@ void SECSimulator::AccumulateAddedResults(const std::vector<double>& inputs,
             const auto it = std::lower_bound(support.begin(), support.end(), x);
             bin = it != support.end() && *it == x ? static_cast<int>(it - support.begin()) : -1;
         } else {
-            bin = SECFirstOrderIndices::NormalScoreBin(fvZ[static_cast<std::size_t>(input.fGroupIndex)]);
+            bin = SECFirstOrderIndices::NormalScoreBin(fCase.fvZ[static_cast<std::size_t>(input.fGroupIndex)]);
         }
         fvFirstOrderBin[i] = bin;
     }

@@ -573,10 +573,7 @@ SECSimulator::CombineNortaNormalCorrs(const std::vector<std::unique_ptr<SECSimul
 // ---- Generation ---------------------------------------------------------------------------------
 
 void SECSimulator::ResetCaseValues() {
-    fvCaseValues.assign(fvSimInputs.size(), MCMV::Missing());
-    fvZ.assign(fvCorrelated.size(), MCMV::Missing());
-    fCrosstabCell = -1;
-    fLastRejections = 0;
+    fCase.Reset(fvSimInputs.size(), fvCorrelated.size());
 }
 
 MCStatus SECSimulator::PrepareGeneration() {
@@ -614,54 +611,55 @@ MCStatus SECSimulator::PrepareGeneration() {
     return fPrepareStatus;
 }
 
-MCStatus SECSimulator::GenerateAttempt() {
+MCStatus SECSimulator::GenerateAttempt(SECCase& c, MCMath_800::MCRandomValues& normals,
+                                       MCMath_800::MCURandom& stream) const {
     if (!fbGenerationPrepared) {
         return fPrepareStatus.IsError() ? fPrepareStatus
                                         : MCStatus(MCSPStatus::kNormalGeneratorFailed, false);
     }
     // 1. The normal vector of the correlated set.
     bool ok = true;
-    if (fvZ.size() == 1) {
-        fvZ[0] = fRandomValues.GetRandom();
-        ok = !MCMV::IsMissing(fvZ[0]);
-    } else if (!fvZ.empty()) {
-        ok = fRandomValues.GetRandom(fvZ);
+    if (c.fvZ.size() == 1) {
+        c.fvZ[0] = normals.GetRandom();
+        ok = !MCMV::IsMissing(c.fvZ[0]);
+    } else if (!c.fvZ.empty()) {
+        ok = normals.GetRandom(c.fvZ);
     }
     if (!ok) {
-        std::fill(fvCaseValues.begin(), fvCaseValues.end(), MCMV::Missing());
-        std::fill(fvZ.begin(), fvZ.end(), MCMV::Missing());
-        fCrosstabCell = -1;
+        std::fill(c.fvInputs.begin(), c.fvInputs.end(), MCMV::Missing());
+        std::fill(c.fvZ.begin(), c.fvZ.end(), MCMV::Missing());
+        c.fCell = -1;
         return MCStatus(MCSPStatus::kNormalGeneratorFailed, false);
     }
     // 2. Each correlated input through its transform.
     for (std::size_t k = 0; k < fvCorrelated.size(); ++k) {
         const CorrelatedInput& input = fvCorrelated[k];
-        fvCaseValues[static_cast<std::size_t>(input.fCasePos)] =
-            SECTransform(input.fGenerator, fvZ[k]);
+        c.fvInputs[static_cast<std::size_t>(input.fCasePos)] =
+            SECTransform(input.fGenerator, c.fvZ[k]);
     }
     // 3. The contingency cell.
-    fCrosstabCell = fbHasCrosstab ? SECDrawCell(fCrosstab.fvCumTable, fpStream->GetRandom()) : -1;
+    c.fCell = fbHasCrosstab ? SECDrawCell(fCrosstab.fvCumTable, stream.GetRandom()) : -1;
     // 4. The categorical values: a factor takes its code in the chosen cell, any other input
     //    its own draw. A code of −1 (a cell naming a category the input lacks) leaves the value
     //    missing, so the attempt is rejected.
     for (const CategoricalInput& input : fvCategorical) {
         const int column = input.fSampler.fCrosstabColumn;
         int code = -1;
-        if (column >= 0 && fCrosstabCell >= 0) {
-            code = fCrosstab.fvCodes[static_cast<std::size_t>(fCrosstabCell)]
+        if (column >= 0 && c.fCell >= 0) {
+            code = fCrosstab.fvCodes[static_cast<std::size_t>(c.fCell)]
                                     [static_cast<std::size_t>(column)];
         } else {
-            code = SECDrawCell(input.fSampler.fvCumTable, fpStream->GetRandom());
+            code = SECDrawCell(input.fSampler.fvCumTable, stream.GetRandom());
         }
-        fvCaseValues[static_cast<std::size_t>(input.fCasePos)] =
+        c.fvInputs[static_cast<std::size_t>(input.fCasePos)] =
             code >= 0 ? static_cast<double>(code) : MCMV::Missing();
     }
     return MCStatus();
 }
 
-bool SECSimulator::AreInputsWithinBounds() const {
+bool SECSimulator::AreInputsWithinBounds(const std::vector<double>& inputs) const {
     for (std::size_t i = 0; i < fvSimInputs.size(); ++i) {
-        const double value = fvCaseValues[i];
+        const double value = inputs[i];
         const SimInput& input = fvSimInputs[i];
         // A value that overflowed to infinity is as unusable as a missing one; an absent bound
         // is an infinite one.
@@ -673,29 +671,30 @@ bool SECSimulator::AreInputsWithinBounds() const {
 }
 
 MCStatus SECSimulator::DrawCase() {
-    return DrawAcceptedCase(false);
+    return DrawAcceptedCase(fCase, fRandomValues, *fpStream, false);
 }
 
-MCStatus SECSimulator::DrawAcceptedCase(bool score) {
-    fLastRejections = 0;
+MCStatus SECSimulator::DrawAcceptedCase(SECCase& c, MCMath_800::MCRandomValues& normals,
+                                        MCMath_800::MCURandom& stream, bool score) {
+    c.fRejections = 0;
     for (int attempt = 0; attempt < SECGenerationConst::kMaxAttempts; ++attempt) {
-        MCStatus status = GenerateAttempt();
+        MCStatus status = GenerateAttempt(c, normals, stream);
         if (status.IsError()) {
             return status;
         }
         // Inputs are checked before the case is scored: a case outside its truncation bounds is
         // rejected whatever its score.
-        if (!AreInputsWithinBounds()) {
-            ++fLastRejections;
+        if (!AreInputsWithinBounds(c.fvInputs)) {
+            ++c.fRejections;
             continue;
         }
         if (score && fpScoreComputer) {
-            status = ScoreInputs(fvCaseValues);
+            status = ScoreInputs(c.fvInputs, c.fvValues);
             if (status.IsError()) {
                 return status;
             }
-            if (!AreTargetsAccepted(fvScoreValues)) {
-                ++fLastRejections;
+            if (!AreTargetsAccepted(c.fvValues)) {
+                ++c.fRejections;
                 continue;
             }
         }
@@ -712,7 +711,7 @@ MCStatus SECSimulator::SimulatePredictors(std::vector<double>& values) {
     if (status.IsError()) {
         std::fill(values.begin(), values.end(), MCMV::Missing());
     } else {
-        std::copy(fvCaseValues.begin(), fvCaseValues.end(), values.begin());
+        std::copy(fCase.fvInputs.begin(), fCase.fvInputs.end(), values.begin());
     }
     return status;
 }

@@ -49,6 +49,7 @@
 #include "mcmath/mcsymmatrix.h"
 #include "mcthread/mcthread.h"
 #include "simulation_common/spcsettings.h"
+#include "simulation_evaluation/seccase.h"
 #include "simulation_evaluation/secfirstorder.h"
 #include "simulation_evaluation/secgeneration.h"
 #include "simulation_evaluation/secnorta.h"
@@ -164,16 +165,21 @@ public:
     //! One attempt: the normal vector, each correlated input's value, the contingency cell and
     //! the categorical values, into the case. Code 390007 (the case all missing) when the
     //! normal generator fails; the preparation's error when generation is not prepared.
-    MCCommon_800::MCStatus GenerateAttempt();
+    MCCommon_800::MCStatus GenerateAttempt() { return GenerateAttempt(fCase, fRandomValues, *fpStream); }
+    //! The same into `c`, from the normal generator `normals` and the uniform stream `stream`.
+    MCCommon_800::MCStatus GenerateAttempt(SECCase& c, MCMath_800::MCRandomValues& normals,
+                                           MCMath_800::MCURandom& stream) const;
     //! True when every value of the case is present and inside its truncation bounds.
-    bool AreInputsWithinBounds() const;
+    bool AreInputsWithinBounds() const { return AreInputsWithinBounds(fCase.fvInputs); }
+    bool AreInputsWithinBounds(const std::vector<double>& inputs) const;
     //! A case with truncation by rejection on the inputs: up to 1000 attempts, code 390014
     //! when all are rejected. GetLastRejections tells how many attempts were rejected.
     MCCommon_800::MCStatus DrawCase();
     //! The one retry loop of truncation by rejection: attempts until the inputs lie inside
     //! their bounds and, with `score` and a score computer, the scored targets pass their
     //! filters; up to 1000 attempts, then code 390014. GetLastRejections counts the rejected.
-    MCCommon_800::MCStatus DrawAcceptedCase(bool score);
+    MCCommon_800::MCStatus DrawAcceptedCase(SECCase& c, MCMath_800::MCRandomValues& normals,
+                                            MCMath_800::MCURandom& stream, bool score);
     //! The host-driven draw: DrawCase into `values`, which is sized to the number of simulated
     //! inputs (filled with 0.0) when its size differs; missing values on failure.
     MCCommon_800::MCStatus SimulatePredictors(std::vector<double>& values);
@@ -224,8 +230,10 @@ public:
     //! chart ranges; then the chart accumulators. 390011 below 1000 valid cases.
     MCCommon_800::MCStatus RunPilot();
     //! Scores the inputs `inputs` (one value per simulated input): fills the input record, calls
-    //! the score computer, reads the values of the score into GetScoreValues.
-    MCCommon_800::MCStatus ScoreInputs(const std::vector<double>& inputs);
+    //! the score computer, reads the values of the score into `values` (all missing when the
+    //! score fails).
+    MCCommon_800::MCStatus ScoreInputs(const std::vector<double>& inputs,
+                                       std::vector<double>& values);
     //! One accepted case: drawn with truncation by rejection on the inputs and the target
     //! filters (up to 1000 attempts, 390014), scored.
     MCCommon_800::MCStatus DrawAndScoreCase();
@@ -261,7 +269,7 @@ public:
         return fStopPoint.fKind != StopKind::kNone || fStopTails.fKind != StopKind::kNone;
     }
     //! Values read from the last score.
-    const std::vector<double>& GetScoreValues() const { return fvScoreValues; }
+    const std::vector<double>& GetScoreValues() const { return fCase.fvValues; }
     //! Number of scores computed (each re-score of the sensitivity measures counts).
     std::int64_t GetScoreCount() const { return fScoreCount; }
     //! The contingency cell counts of the accumulated cases.
@@ -343,13 +351,13 @@ public:
     // ---- The current case and counters -----------------------------------------------
 
     //! The case: one value per simulated input in plan order.
-    const std::vector<double>& GetCaseValues() const { return fvCaseValues; }
+    const std::vector<double>& GetCaseValues() const { return fCase.fvInputs; }
     //! The normal vector of the last attempt, one value per correlated input.
-    const std::vector<double>& GetNormalValues() const { return fvZ; }
+    const std::vector<double>& GetNormalValues() const { return fCase.fvZ; }
     //! The contingency cell of the last attempt; −1 without a table.
-    int GetCrosstabCell() const { return fCrosstabCell; }
+    int GetCrosstabCell() const { return fCase.fCell; }
     //! Rejected attempts of the last DrawCase.
-    int GetLastRejections() const { return fLastRejections; }
+    int GetLastRejections() const { return fCase.fRejections; }
     //! Counters of the case loop: cases drawn (valid or failed), rejected attempts, valid
     //! cases, failed cases.
     int GetSimCaseCount() const { return fSimCaseCount; }
@@ -427,8 +435,8 @@ private:
     void SetupStopCriteria();
     //! True when every target value in `values` is present and inside its filter.
     bool AreTargetsAccepted(const std::vector<double>& values) const;
-    //! Reads the output record into fvScoreValues.
-    void ReadScore();
+    //! Reads the output record into `values` (one per value of a score).
+    void ReadScore(std::vector<double>& values);
     //! Sets the chart ranges that are still open from the pilot's or start-up statistics.
     void FixChartRanges(const std::vector<MCMath_800::MCContStats>& inputStats,
                         const std::vector<MCMath_800::MCContStats>& targetStats);
@@ -458,8 +466,8 @@ private:
     //! variant that cannot be evaluated leaves its cells missing (skipped and counted); the
     //! base case, its values and the base stream are never changed.
     void ComputeCaseSensitivity();
-    //! The variance measure's further independent case, drawn from its own stream into
-    //! fvFurther; false when no acceptable case could be drawn.
+    //! The variance measure's further independent case, drawn and scored from its own stream
+    //! into fFurther; false when no acceptable case could be drawn.
     bool DrawFurtherCase();
     //! Adds the current case's differences and products to the statistics.
     void AccumulateSensitivity();
@@ -519,10 +527,7 @@ private:
 
     bool fbGenerationPrepared = false;     //!< the normal generator is set
     MCCommon_800::MCStatus fPrepareStatus; //!< outcome of the last preparation
-    std::vector<double> fvZ;               //!< normal vector of the case
-    std::vector<double> fvCaseValues;      //!< the case
-    int fCrosstabCell = -1;                //!< chosen contingency cell
-    int fLastRejections = 0;               //!< rejected attempts of the last case
+    SECCase fCase;                         //!< the current case
 
     int fCaseQuota = 0;         //!< cases the case loop draws
     int fSimCaseCount = 0;      //!< cases drawn, valid or failed
@@ -539,7 +544,6 @@ private:
     int fNValuesPerCase = 0;              //!< values read from a score
     bool fbHostDriven = false;            //!< targets from the plan (PrepareTargetInfo)
     std::vector<Target> fvTargets;        //!< target order
-    std::vector<double> fvScoreValues;    //!< values of the last score
     std::vector<int> fvLastCode;          //!< category last written to the input record
     //! Extremes of each covariate; their moments are in the cross products (fProvMeans).
     std::vector<double> fvCovarMin;
@@ -582,11 +586,9 @@ private:
     std::vector<double> fvPosDiff;     //!< continuous target × covariate
     std::vector<double> fvNegDiff;     //!< continuous target × covariate
     std::vector<double> fvProducts;    //!< continuous target × covariate
-    std::vector<double> fvSavedInputs; //!< the case's inputs
-    std::vector<double> fvSavedValues; //!< the case's score values
-    std::vector<double> fvWorkInputs;  //!< a variant of the case
-    std::vector<double> fvFurther;     //!< the further independent case
-    std::vector<double> fvSavedZ;      //!< the case's normal scores
+    std::vector<double> fvWorkInputs;  //!< a variant of the case's inputs
+    std::vector<double> fvWorkValues;  //!< the variant's score
+    SECCase fFurther;                  //!< the further independent case
     //! Stream and normal generator of the further cases: apart from the base stream, so that
     //! the variance measure does not move the base cases (created on first use).
     std::unique_ptr<MCMath_800::MCURandom> fpFurtherStream;
