@@ -25,7 +25,7 @@
 // contingency factor) as a number. Drawing allocates nothing: the working vectors are sized
 // when the generation is prepared.
 //
-// Scoring and statistics (secscoring.cpp): StartScoring lays out the input record (simulated
+// Scoring and statistics (secscoring.cpp, secaccumulate.cpp): StartScoring lays out the input record (simulated
 // inputs, then fixed inputs) and the score computer's output record; the target set-up
 // (ProcessTargetInfo with a score computer, PrepareTargetInfo from the plan for the host-driven
 // way) decides which values of a score are targets, their filters, chart budget and stop
@@ -406,7 +406,7 @@ private:
     //! The index of distribution or value this iteration uses among `count` of them.
     std::size_t IterationIndex(std::size_t count) const;
 
-    // ---- Scoring internals (secscoring.cpp) ----------------------------------------------
+    // ---- Scoring and statistics internals ------------------------------------------------
 
     enum class StopKind { kNone, kPointValue, kTails };
     //! The stop criterion of the run and its state.
