@@ -188,7 +188,9 @@ void WriteContinuous(std::ostream& out, const ReportContinuousTarget& t,
             << " distribution-free interval, - where the cases cannot give an end)\n";
         std::vector<std::vector<std::string>> prows;
         for (const ReportPercentile& p : t.fvPercentiles) {
-            const auto end = [](double x) { return MCMV::IsMissing(x) ? std::string("-") : Num(x); };
+            const auto end = [](double x) {
+                return MCMV::IsMissing(x) ? std::string("-") : Num(x);
+            };
             prows.push_back({MCCommon_800::FormatDefault(p.fPercent) + "%", Num(p.fValue),
                              end(p.fLower) + " to " + end(p.fUpper)});
         }

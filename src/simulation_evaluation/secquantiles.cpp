@@ -152,8 +152,7 @@ double SECQuantileSummary::OrderStatistic(std::int64_t rank) const {
         return MCMV::Missing();
     }
     SortView();
-    const auto it =
-        std::lower_bound(fvViewCum.begin(), fvViewCum.end(), static_cast<double>(rank));
+    const auto it = std::lower_bound(fvViewCum.begin(), fvViewCum.end(), static_cast<double>(rank));
     const std::size_t i = it == fvViewCum.end() ? fvViewCum.size() - 1
                                                 : static_cast<std::size_t>(it - fvViewCum.begin());
     return fvViewValues[i];

@@ -270,7 +270,8 @@ void SECSimulator::AccumulateAddedResults(const std::vector<double>& inputs,
             const auto it = std::lower_bound(support.begin(), support.end(), x);
             bin = it != support.end() && *it == x ? static_cast<int>(it - support.begin()) : -1;
         } else {
-            bin = SECFirstOrderIndices::NormalScoreBin(fCase.fvZ[static_cast<std::size_t>(input.fGroupIndex)]);
+            const auto group = static_cast<std::size_t>(input.fGroupIndex);
+            bin = SECFirstOrderIndices::NormalScoreBin(fCase.fvZ[group]);
         }
         fvFirstOrderBin[i] = bin;
     }

@@ -25,15 +25,15 @@
 // contingency factor) as a number. Drawing allocates nothing: the working vectors are sized
 // when the generation is prepared.
 //
-// Scoring and statistics (secscoring.cpp, secaccumulate.cpp): StartScoring lays out the input record (simulated
-// inputs, then fixed inputs) and the score computer's output record; the target set-up
-// (ProcessTargetInfo with a score computer, PrepareTargetInfo from the plan for the host-driven
-// way) decides which values of a score are targets, their filters, chart budget and stop
-// criterion. A case is accepted when its inputs lie inside their truncation bounds and its
+// Scoring and statistics (secscoring.cpp, secaccumulate.cpp): StartScoring lays out the input
+// record (simulated inputs, then fixed inputs) and the score computer's output record; the target
+// set-up (ProcessTargetInfo with a score computer, PrepareTargetInfo from the plan for the
+// host-driven way) decides which values of a score are targets, their filters, chart budget and
+// stop criterion. A case is accepted when its inputs lie inside their truncation bounds and its
 // targets are present and inside their filters; an accepted case is accumulated into the
 // simulator's results (SECOutputStats), the means and cross products and the contingency cell
-// counts. The master merges its workers' statistics in thread order and completes the results.
-// The sensitivity measures (secsensitivity.cpp) re-score variants of each accepted case.
+// counts. The master merges its workers' statistics in thread order and completes the results. The
+// sensitivity measures (secsensitivity.cpp) re-score variants of each accepted case.
 //
 // Threads: a simulator is used by one thread at a time. The NORTA workers and the case workers
 // share nothing but the read-only settings, plan and variable list and the cancel record.
@@ -165,7 +165,9 @@ public:
     //! One attempt: the normal vector, each correlated input's value, the contingency cell and
     //! the categorical values, into the case. Code 390007 (the case all missing) when the
     //! normal generator fails; the preparation's error when generation is not prepared.
-    MCCommon_800::MCStatus GenerateAttempt() { return GenerateAttempt(fCase, fRandomValues, *fpStream); }
+    MCCommon_800::MCStatus GenerateAttempt() {
+        return GenerateAttempt(fCase, fRandomValues, *fpStream);
+    }
     //! The same into `c`, from the normal generator `normals` and the uniform stream `stream`.
     MCCommon_800::MCStatus GenerateAttempt(SECCase& c, MCMath_800::MCRandomValues& normals,
                                            MCMath_800::MCURandom& stream) const;
@@ -479,8 +481,8 @@ private:
     void PrepareAddedResults();
     //! Adds the accepted case to the quantile summaries and, with its normal scores
     //! (`withScores`), to the first-order accumulator.
-    void AccumulateAddedResults(const std::vector<double>& inputs, const std::vector<double>& values,
-                                bool withScores);
+    void AccumulateAddedResults(const std::vector<double>& inputs,
+                                const std::vector<double>& values, bool withScores);
     //! The first-order indices of every continuous target.
     void CompleteAddedResults();
 

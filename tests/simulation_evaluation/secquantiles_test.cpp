@@ -27,7 +27,9 @@ struct Values {
 
 const Values kValues[] = {
     {"LogNormalSkewed",
-     [](boost::random::mt19937& g) { return boost::random::lognormal_distribution<>(0.0, 1.5)(g); }},
+     [](boost::random::mt19937& g) {
+         return boost::random::lognormal_distribution<>(0.0, 1.5)(g);
+     }},
     {"StudentT1HeavyTails",
      [](boost::random::mt19937& g) { return boost::random::student_t_distribution<>(1.0)(g); }},
     {"PoissonDiscrete",
