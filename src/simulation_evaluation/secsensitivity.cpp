@@ -226,17 +226,22 @@ void SECSimulator::PrepareAddedResults() {
     }
     std::vector<int> bins(fvSimInputs.size(), SECFirstOrderIndices::kNormalScoreBins);
     fvFirstOrderValues.assign(fvSimInputs.size(), {});
+    fvFirstOrderScore.assign(fvSimInputs.size(), -1);
+    fvFirstOrderCats.assign(fvSimInputs.size(), 0);
     for (std::size_t i = 0; i < fvSimInputs.size(); ++i) {
         const SimInput& input = fvSimInputs[i];
         const auto group = static_cast<std::size_t>(input.fGroupIndex);
         if (input.fbCategorical) {
-            bins[i] = static_cast<int>(fvCategorical[group].fSampler.fvCategoryText.size());
+            fvFirstOrderCats[i] = fvCategorical[group].fSampler.fvCategoryText.size();
+            bins[i] = static_cast<int>(fvFirstOrderCats[i]);
             continue;
         }
         std::vector<double> cdf;
         if (SECDiscreteSupport(fvCorrelated[group].fGenerator, kFirstOrderValueBins,
                                fvFirstOrderValues[i], cdf)) {
             bins[i] = static_cast<int>(fvFirstOrderValues[i].size());
+        } else {
+            fvFirstOrderScore[i] = input.fGroupIndex;
         }
     }
     fFirstOrder.Reset(bins, fvContCentre);
@@ -258,20 +263,22 @@ void SECSimulator::AccumulateAddedResults(const std::vector<double>& inputs,
         return;
     }
     for (std::size_t i = 0; i < fvSimInputs.size(); ++i) {
-        const SimInput& input = fvSimInputs[i];
+        const int score = fvFirstOrderScore[i];
+        if (score >= 0) {
+            fvFirstOrderBin[i] =
+                SECFirstOrderIndices::NormalScoreBin(fCase.fvZ[static_cast<std::size_t>(score)]);
+            continue;
+        }
         const double x = inputs[i];
         int bin = -1;
-        if (input.fbCategorical) {
-            const std::size_t nCats = fvCategorical[static_cast<std::size_t>(input.fGroupIndex)]
-                                          .fSampler.fvCategoryText.size();
-            bin = x >= 0.0 && x < static_cast<double>(nCats) ? static_cast<int>(x) : -1;
-        } else if (!fvFirstOrderValues[i].empty()) {
+        if (fvFirstOrderValues[i].empty()) {
+            // A categorical input: its category index.
+            bin = x >= 0.0 && x < static_cast<double>(fvFirstOrderCats[i]) ? static_cast<int>(x)
+                                                                           : -1;
+        } else {
             const std::vector<double>& support = fvFirstOrderValues[i];
             const auto it = std::lower_bound(support.begin(), support.end(), x);
             bin = it != support.end() && *it == x ? static_cast<int>(it - support.begin()) : -1;
-        } else {
-            const auto group = static_cast<std::size_t>(input.fGroupIndex);
-            bin = SECFirstOrderIndices::NormalScoreBin(fCase.fvZ[group]);
         }
         fvFirstOrderBin[i] = bin;
     }

@@ -606,6 +606,10 @@ private:
     //! Per simulated input: its values when it is discrete with few of them (a bin each);
     //! empty for the other inputs.
     std::vector<std::vector<double>> fvFirstOrderValues;
+    //! Per simulated input: its place among the normal scores when it is binned by them, −1
+    //! otherwise.
+    std::vector<int> fvFirstOrderScore;
+    std::vector<std::size_t> fvFirstOrderCats; //!< categories of a categorical input, else 0
     std::vector<int> fvFirstOrderBin;      //!< the case's bin of each simulated input
     std::vector<double> fvFirstOrderY;     //!< the case's continuous targets
 
