@@ -403,6 +403,34 @@ void PrintCandidate(std::ostream& out, const std::string& lead,
     out << "\n";
 }
 
+//! "  std errors shape 4.18, rate 0.00459; correlation 0.992", or why they are missing; nothing
+//! for a candidate without them.
+void PrintStdErrors(std::ostream& out, const DFCOutputStats::DFCVarDistElement& e) {
+    const std::vector<std::string> names = ReportParamNames(e.fDistType, e.fDistParamNames);
+    std::string list;
+    std::vector<std::size_t> shown;
+    for (std::size_t i = 0; i < e.fvStdErrors.size() && i < names.size(); ++i) {
+        if (!MCMV::IsMissing(e.fvStdErrors[i])) {
+            list += (list.empty() ? "" : ", ") + names[i] + " " + Num(e.fvStdErrors[i]);
+            shown.push_back(i);
+        }
+    }
+    const std::size_t n = e.fDistParams.size();
+    if (shown.size() == 2 && e.fvParamCorrelations.size() == n * n) {
+        // Three decimals: a correlation that is 0 at the maximum shows the Hessian's rounding.
+        std::ostringstream r;
+        const double rho = e.fvParamCorrelations[shown[0] * n + shown[1]];
+        r << std::fixed << std::setprecision(3) << (std::fabs(rho) < 5e-4 ? 0.0 : rho);
+        list += "; correlation " + r.str();
+    }
+    if (!e.fStdErrorReason.empty()) {
+        list += (list.empty() ? "missing: " : " (") + e.fStdErrorReason + (list.empty() ? "" : ")");
+    }
+    if (!list.empty()) {
+        out << "  std errors " << list << "\n";
+    }
+}
+
 std::string StatisticName(MeasureLevel level, GoodFitType type) {
     if (level != kLevelContinuous) {
         return "chi-square";
@@ -445,6 +473,10 @@ void PrintCovariate(std::ostream& out, const DFCOutputStats::DFCVarDistInfo& inf
         }
         out << "\n";
         out << "  chosen by  " << decision.fRule << ": " << decision.fWhy << "\n";
+        const auto k = static_cast<std::size_t>(info.fDistBestType);
+        if (k < info.fDistElements.size()) {
+            PrintStdErrors(out, info.fDistElements[k]);
+        }
     } else {
         out << "  best fit   none in the results\n";
     }

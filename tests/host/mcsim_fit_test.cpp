@@ -404,6 +404,9 @@ TEST(McsimFit, JsonChoicesAndBootstrap) {
             EXPECT_EQ(c["dropped_reason"], "a value lies outside the family's support");
         }
     }
+    const CommandRun text = Mcsim({"fit", data, "--choose", "aic"}, dir);
+    EXPECT_NE(text.out.find("chosen by  AIC: smallest AIC"), std::string::npos) << text.out;
+    EXPECT_NE(text.out.find("std errors shape 4.18"), std::string::npos) << text.out;
     const auto byAd = fit({}, "ad.json");
     EXPECT_EQ(byAd["fields"][0]["best"]["family"], "Lognormal");
 
