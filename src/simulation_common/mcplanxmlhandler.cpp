@@ -79,7 +79,7 @@ void Put(DOMElement* element, const std::string& name, double value) {
 // The correlation cells are not made DOM nodes: a matrix of N variables has N(N+1)/2 cells
 // and as nodes they take some twenty times their text. The CorrMatrix element gets a
 // processing instruction as a place holder, and the cells' text replaces it in the
-// serialised document (SpliceCorrCells).
+// serialised document (CorrCellWriter::Splice).
 constexpr char kCorrCellsTarget[] = "mcsim-corr-cells";
 
 //! `text` as an attribute value in the serialised document: the markup characters and the
@@ -117,51 +117,83 @@ std::string AttributeValueText(const std::string& text) {
     return out;
 }
 
-//! The CorrCell elements of `cells`, attributes in the order the serialiser writes them.
-//! Each name goes once through the DOM, so that a name XML cannot carry fails the write as it
-//! would as an attribute, and is written as the DOM holds it.
-std::string CorrCellsText(DOMElement* scratch,
-                          const std::vector<SPCSettings::CorrMatrixCell>& cells) {
-    std::unordered_map<std::string, std::string> written;
-    const auto nameText = [&](const std::string& name) -> const std::string& {
-        auto it = written.find(name);
-        if (it == written.end()) {
-            Put(scratch, "name", name);
-            const std::string held = MCXML_800::ToUTF8(MCXML_800::GetAttribute(scratch, "name"));
-            it = written.emplace(name, AttributeValueText(held)).first;
+// The CorrCell elements' text, written into the serialised document in place of the place
+// holder, so that the cells exist once, as the output's own text. Attributes come in the order
+// the serialiser writes them. Each name goes once through the DOM (on a scratch element), so
+// that a name XML cannot carry fails the write as it would as an attribute, and is written as
+// the DOM holds it.
+class CorrCellWriter {
+public:
+    explicit CorrCellWriter(DOMElement* scratch) : fpScratch(scratch) {}
+
+    //! The cells of the triangle `rows` over `names` (GetCorrMatrixCellCollection's order);
+    //! both must outlive the writer.
+    void SetTriangle(const std::vector<std::string>& names,
+                     const std::vector<std::vector<double>>& rows) {
+        fpNames = &names;
+        fpRows = &rows;
+        fCells = 0;
+        for (std::size_t r = 0; r < Rows(); ++r) {
+            fCells += std::min(r + 1, rows[r].size());
         }
-        return it->second;
-    };
-    std::string text;
-    for (const SPCSettings::CorrMatrixCell& cell : cells) {
+    }
+    std::size_t GetCellCount() const { return fCells; }
+
+    //! Replaces the place holder in the serialised `out` by the cells; false without one.
+    bool Splice(std::string& out) {
+        const std::string open = std::string("<?") + kCorrCellsTarget;
+        const std::size_t at = out.find(open);
+        const std::size_t end = at == std::string::npos ? at : out.find("?>", at);
+        if (end == std::string::npos) {
+            return false;
+        }
+        // About 60 bytes a cell for short names, so the text is rarely moved as it grows.
+        std::string spliced;
+        spliced.reserve(out.size() + 60 * fCells);
+        spliced.append(out, 0, at);
+        const std::vector<std::vector<double>>& rows = *fpRows;
+        for (std::size_t r = 0; r < Rows(); ++r) {
+            for (std::size_t c = 0; c <= r && c < rows[r].size(); ++c) {
+                AppendCell(spliced, (*fpNames)[r], (*fpNames)[c], rows[r][c]);
+            }
+        }
+        spliced.append(out, end + 2, std::string::npos);
+        out.swap(spliced);
+        return true;
+    }
+
+private:
+    std::size_t Rows() const {
+        return fpRows == nullptr ? 0 : std::min(fpRows->size(), fpNames->size());
+    }
+
+    void AppendCell(std::string& text, const std::string& rowVar, const std::string& colVar,
+                    double value) {
         text += "<CorrCell colVar=\"";
-        text += nameText(cell.fColVar);
+        text += NameText(colVar);
         text += "\" rowVar=\"";
-        text += nameText(cell.fRowVar);
+        text += NameText(rowVar);
         text += "\" value=\"";
-        text += MCMV::IsMissing(cell.fValue) ? std::string(".")
-                                             : MCCommon_800::FormatRoundTrip(cell.fValue);
+        text += MCMV::IsMissing(value) ? std::string(".") : MCCommon_800::FormatRoundTrip(value);
         text += "\"/>";
     }
-    return text;
-}
 
-//! Replaces the place holder in the serialised `out` by `cellsText`; false without one.
-bool SpliceCorrCells(std::string& out, const std::string& cellsText) {
-    const std::string open = std::string("<?") + kCorrCellsTarget;
-    const std::size_t at = out.find(open);
-    const std::size_t end = at == std::string::npos ? at : out.find("?>", at);
-    if (end == std::string::npos) {
-        return false;
+    const std::string& NameText(const std::string& name) {
+        auto it = fWritten.find(name);
+        if (it == fWritten.end()) {
+            Put(fpScratch, "name", name);
+            const std::string held = MCXML_800::ToUTF8(MCXML_800::GetAttribute(fpScratch, "name"));
+            it = fWritten.emplace(name, AttributeValueText(held)).first;
+        }
+        return it->second;
     }
-    std::string spliced;
-    spliced.reserve(out.size() + cellsText.size());
-    spliced.append(out, 0, at);
-    spliced += cellsText;
-    spliced.append(out, end + 2, std::string::npos);
-    out.swap(spliced);
-    return true;
-}
+
+    DOMElement* fpScratch;                                    //!< takes each name once
+    const std::vector<std::string>* fpNames = nullptr;        //!< the variables
+    const std::vector<std::vector<double>>* fpRows = nullptr; //!< the triangle
+    std::size_t fCells = 0;                                   //!< cells of the triangle
+    std::unordered_map<std::string, std::string> fWritten;    //!< name -> its attribute text
+};
 
 void PutCount(DOMElement* element, const std::string& name, std::size_t count) {
     Put(element, name, static_cast<double>(count));
@@ -399,16 +431,15 @@ bool MCPlanXMLHandler::WritePlanFile(std::string& out, const SPCSettings* plan) 
             static_cast<void>(InsertElement(root, fixedFields));
         }
 
-        std::vector<SPCSettings::CorrMatrixCell> cells;
-        plan->GetCorrMatrixCellCollection(cells);
-        std::string cellsText;
-        if (!cells.empty()) {
+        // The cells straight from the plan's triangle: no list of cells with copies of names.
+        CorrCellWriter cells(NewElement(root, "CorrCell"));
+        cells.SetTriangle(plan->GetCorrVarList(), plan->GetCorrMatrix());
+        if (cells.GetCellCount() > 0) {
             DOMElement* corrMatrix = NewElement(root, "CorrMatrix");
-            if (!AddCorrMetrixElement(corrMatrix, cells, plan->GetCorrLocked(), cellsText)) {
+            if (!AddCorrMetrixElement(corrMatrix, cells.GetCellCount(), plan->GetCorrLocked())) {
                 return false;
             }
             static_cast<void>(InsertElement(root, corrMatrix));
-            cells = std::vector<SPCSettings::CorrMatrixCell>();
         }
 
         if (!plan->GetCrstabsFactors().empty()) {
@@ -425,8 +456,7 @@ bool MCPlanXMLHandler::WritePlanFile(std::string& out, const SPCSettings* plan) 
             return false;
         }
 
-        return WriteFromDOM(out, doc.get()) &&
-               (cellsText.empty() || SpliceCorrCells(out, cellsText));
+        return WriteFromDOM(out, doc.get()) && (cells.GetCellCount() == 0 || cells.Splice(out));
     } catch (...) {
         return false;
     }
@@ -703,12 +733,10 @@ bool MCPlanXMLHandler::AddFixedFieldsEle(DOMElement* fixedFields,
     return true;
 }
 
-bool MCPlanXMLHandler::AddCorrMetrixElement(DOMElement* corrMatrix,
-                                            const std::vector<SPCSettings::CorrMatrixCell>& cells,
-                                            bool locked, std::string& cellsText) {
-    PutCount(corrMatrix, "numberOfCells", cells.size());
+bool MCPlanXMLHandler::AddCorrMetrixElement(DOMElement* corrMatrix, std::size_t nCells,
+                                            bool locked) {
+    PutCount(corrMatrix, "numberOfCells", nCells);
     PutYesNo(corrMatrix, "locked", locked);
-    cellsText = CorrCellsText(NewElement(corrMatrix, "CorrCell"), cells);
     xercesc::DOMDocument* doc = corrMatrix->getOwnerDocument();
     return InsertElement(corrMatrix, doc->createProcessingInstruction(
                                          ToUTF16(kCorrCellsTarget).c_str(), ToUTF16("").c_str()));
@@ -806,6 +834,30 @@ bool MCPlanXMLHandler::SetDoubleAttribute(DOMElement* element, const std::string
 
 namespace {
 
+//! The covariates' correlation triangle of the fitting results and its variables, as
+//! GetCorrMatrixCellCollectionFrom lists them: nothing for fewer than two rows or for a row
+//! without a record.
+void CovariateTriangle(const DFCOutputStats& results, std::vector<std::string>& names,
+                       std::vector<std::vector<double>>& rows) {
+    const MCMath_800::MCSymMatrix& matrix = results.GetCorrMatrix();
+    const std::vector<DFCOutputStats::DFCVarDistInfo>& records = results.GetCovarDistInfo();
+    const int n = matrix.GetNRows();
+    if (n <= 1 || static_cast<std::size_t>(n) > records.size()) {
+        return;
+    }
+    for (int r = 0; r < n; ++r) {
+        std::vector<double> row;
+        if (!matrix.GetRow(r, row)) {
+            names.clear();
+            rows.clear();
+            return;
+        }
+        row.resize(std::min(row.size(), static_cast<std::size_t>(r) + 1));
+        names.push_back(records[static_cast<std::size_t>(r)].fFittedVarName);
+        rows.push_back(std::move(row));
+    }
+}
+
 //! Parameter `i` of a fitted distribution, missing when the list is shorter.
 double ParamAt(const std::vector<double>& params, std::size_t i) {
     return i < params.size() ? params[i] : MCMV::Missing();
@@ -849,12 +901,14 @@ bool MCPlanXMLHandler::WriteFittingOutStats(std::string& out, const DFCOutputSta
         bool result = InsertElement(root, simulatedFields);
 
         // A matrix that cannot be listed gives no cells, and then no CorrMatrix.
-        std::vector<SPCSettings::CorrMatrixCell> cells;
-        static_cast<void>(SPCSettings::GetCorrMatrixCellCollectionFrom(cells, results));
-        std::string cellsText;
-        if (!cells.empty()) {
+        std::vector<std::string> names;
+        std::vector<std::vector<double>> rows;
+        CovariateTriangle(*results, names, rows);
+        CorrCellWriter cells(NewElement(root, "CorrCell"));
+        cells.SetTriangle(names, rows);
+        if (cells.GetCellCount() > 0) {
             DOMElement* corrMatrix = NewElement(root, "CorrMatrix");
-            if (!AddCorrMetrixElement(corrMatrix, cells, false, cellsText)) {
+            if (!AddCorrMetrixElement(corrMatrix, cells.GetCellCount(), false)) {
                 return false;
             }
             result = InsertElement(root, corrMatrix) && result;
@@ -876,7 +930,7 @@ bool MCPlanXMLHandler::WriteFittingOutStats(std::string& out, const DFCOutputSta
         }
 
         return result && WriteFromDOM(out, doc.get()) &&
-               (cellsText.empty() || SpliceCorrCells(out, cellsText));
+               (cells.GetCellCount() == 0 || cells.Splice(out));
     } catch (...) {
         return false;
     }

@@ -182,11 +182,9 @@ private:
 
     // ---- Builders shared with the fitting statistics document ------------------------------
 
-    //! `numberOfCells`, `locked` and a place holder for the cells, whose text (one `CorrCell`
-    //! per cell) goes to `cellsText`, to replace the place holder once serialised.
-    bool AddCorrMetrixElement(xercesc::DOMElement* corrMatrix,
-                              const std::vector<SPCSettings::CorrMatrixCell>& cells, bool locked,
-                              std::string& cellsText);
+    //! `numberOfCells`, `locked` and a place holder that the text of the cells (one
+    //! `CorrCell` per cell, written beside the DOM) replaces once the document is serialised.
+    bool AddCorrMetrixElement(xercesc::DOMElement* corrMatrix, std::size_t nCells, bool locked);
     //! The counts, `CrossFactors` and one `TableCell` per row.
     bool AddCrossTabMetrixElement(xercesc::DOMElement* table,
                                   const std::vector<std::string>& factors,

@@ -123,7 +123,10 @@ INSTANTIATE_TEST_SUITE_P(
         BadCase{"UnterminatedQuote", "a,b\n1,\"oops\n2,3\n4,5\n", "f.csv:2:", "not closed"},
         BadCase{"TextAfterClosingQuote", "a\n\"x\"y\n", "f.csv:2:", "follows a closing quote"},
         BadCase{"TextAfterClosingQuoteLaterLine", "a\n\"x\ny\"z\n",
-                "f.csv:3:", "follows a closing quote"}),
+                "f.csv:3:", "follows a closing quote"},
+        // One field more than the cap, refused as it begins (MCSIM_MAX_FIELDS raises it).
+        BadCase{"TooManyFields", "a\n" + std::string(100000, ',') + "\n", "f.csv:2:",
+                "more than 100000 fields; set MCSIM_MAX_FIELDS"}),
     [](const auto& p) { return std::string(p.param.name); });
 
 TEST(CsvReader, RefusesARunawayField) {
