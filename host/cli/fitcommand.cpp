@@ -778,6 +778,9 @@ void CheckFitOptions(const FitOptions& options) {
     if (options.fModelPath.empty() && !options.fvTargets.empty()) {
         throw UsageError("--targets needs --model");
     }
+    if (options.fSeed >= 0 && options.fBootstrap == 0) {
+        throw UsageError("--seed seeds the bootstrap's draws: add --bootstrap N");
+    }
     static_cast<void>(CollectLevels(options));
     static_cast<void>(ParseFixed(options.fvFixed));
     static_cast<void>(ParseFamilyFilter(options.fvFamilies, options.fvExclude));

@@ -276,6 +276,7 @@ INSTANTIATE_TEST_SUITE_P(
                "",
                2},
         BadRun{"UnknownRule", "", {"--choose", "lnl"}, "--choose lnl: expected ad, ks, aic", "", 2},
+        BadRun{"SeedWithoutBootstrap", "", {"--seed", "3"}, "add --bootstrap N", "", 2},
         BadRun{"RuleWithoutItsStatistic", "", {"--rank", "ks"}, "--rank ks needs --test ks", "", 2},
         BadRun{"FilterOfAnUnfittedField",
                "",
