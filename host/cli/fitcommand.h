@@ -4,7 +4,11 @@
 // correlations, the contingency table and the warnings. With -o it writes the simulation plan
 // (every fitted field an autofit input completed with its best distribution, the fitted
 // correlations and contingency table, the model file and its targets); with --fit-stats the
-// fitting statistics document. Files are written to a temporary name and renamed when whole.
+// fitting statistics document; with --json every candidate's results (cli/fitjson.h).
+// --families/--exclude narrow the candidates, --choose/--empirical-below decide what the plan
+// takes and --rank the report's order (cli/fitoptions.h); --bootstrap refits every candidate
+// to samples drawn from it (cli/fitbootstrap.h). Files are written to a temporary name and
+// renamed when whole.
 #pragma once
 
 #include <CLI/CLI.hpp>

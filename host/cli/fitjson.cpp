@@ -3,6 +3,7 @@
 #include "cli/statustext.h"
 #include "mccommon/mcmv.h"
 
+#include <algorithm>
 #include <cmath>
 #include <map>
 
