@@ -146,8 +146,8 @@ row() {
     for t in "${trees[@]}"; do
         # shellcheck disable=SC2086
         printf '| %s | %s | %s | %s | %s | %s | %s |\n' "$kind" "$size" "$(name "$t")" \
-            "$(stats ${cpu[$t]})" "$(median ${mem[$t]})" "$(stats ${fcpu[$t]})" \
-            "$(median ${fmem[$t]})"
+            "$(stats ${cpu[$t]:-})" "$(median ${mem[$t]:-})" "$(stats ${fcpu[$t]:-})" \
+            "$(median ${fmem[$t]:-})"
     done
 }
 
