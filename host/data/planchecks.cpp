@@ -374,7 +374,7 @@ void CheckContingencyTable(const SPCSettings& plan, const PlanSource& source) {
     }
     const std::string probs = ProbabilityProblem(plan.GetCrstabsProbs());
     if (!probs.empty()) {
-        refuse("has " + probs);
+        refuse("has no usable probabilities: " + probs);
     }
 }
 

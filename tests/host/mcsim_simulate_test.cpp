@@ -398,6 +398,12 @@ TEST_P(McsimSimulateBadInput, OneMessageNoOutput) {
     EXPECT_EQ(hosttest::Snapshot(dir), before) << "an input changed or an output was left";
 }
 
+//! `args` as they are, for inputs that are not files in the test's folder.
+std::function<std::vector<std::string>(const hosttest::TempDir&)>
+PlanArgs(std::vector<std::string> args) {
+    return [args](const hosttest::TempDir&) { return args; };
+}
+
 //! The example plan in `dir` followed by `options`.
 std::function<std::vector<std::string>(const hosttest::TempDir&)>
 PlanThen(std::vector<std::string> options) {
@@ -523,7 +529,62 @@ INSTANTIATE_TEST_SUITE_P(
                               "threshold=\"1\" frequency=\"10\"/></Criteria></Settings>"}});
                  },
                  "a stop criterion names 'volume_band', which is not a continuous target"},
-        // The plan checks: one line naming the file, the line, the field and the value.
+        BadInput{"MissingModel",
+                 [](const hosttest::TempDir& d) {
+                     return std::vector<std::string>{d.Write("plan.xml", DemandPlan()), "--model",
+                                                     d.File("none.model")};
+                 },
+                 "none.model: cannot open the model file"},
+        BadInput{"ModelSyntaxError",
+                 [](const hosttest::TempDir& d) {
+                     return PlanAndModel(d, "unit_margin = price * (units\n");
+                 },
+                 "bad.model:1: syntax error"},
+        BadInput{"ModelUnknownField",
+                 [](const hosttest::TempDir& d) {
+                     return PlanAndModel(d, "unit_margin = price\nrevenue = price * volume\n");
+                 },
+                 "bad.model:2: unknown name 'volume'"},
+        BadInput{"TextInputWithoutLevels",
+                 [](const hosttest::TempDir& d) {
+                     return PlanAndModel(d, "unit_margin = price\nnorth = region == 0\n");
+                 },
+                 "bad.model:2: the model uses 'region', which holds text"},
+        BadInput{"PlanTargetNotInModel",
+                 [](const hosttest::TempDir& d) {
+                     return PlanAndModel(d, "unit_margin = price - unit_cost\n");
+                 },
+                 "the plan names the target 'revenue'"},
+        // Usage errors: found before the plan is simulated.
+        BadInput{"UnknownOption", PlanThen({"--bogus"}), "--bogus; see 'mcsim simulate --help'", 2},
+        BadInput{"CasesNotWhole", PlanThen({"--cases", "2.5"}),
+                 "--cases: 2.5 is not a whole number; expected a whole number from 1 to", 2},
+        BadInput{"PercentileZero", PlanThen({"--percentiles", "5,0"}),
+                 "--percentiles 0: a percentile lies strictly between 0 and 100", 2},
+        BadInput{"TornadoDeltaNan", PlanThen({"--tornado-delta", "nan"}),
+                 "expected a number above 0 and at most 100, not 'nan'", 2},
+        BadInput{"JsonOverThePlan", PlanThen({"--json", "@plan.xml"}),
+                 "plan.xml: this is the plan file; choose another output file", 2},
+        BadInput{"CasesOutIsALinkToTheModel",
+                 [](const hosttest::TempDir& d) {
+                     const std::string model = d.Write("m.model", hosttest::ReadFile(kModel));
+                     std::filesystem::create_symlink(model, d.File("link.csv"));
+                     return std::vector<std::string>{d.Write("plan.xml", DemandPlan()), "--model",
+                                                     model, "--cases-out", d.File("link.csv")};
+                 },
+                 "link.csv: this is the model file", 2},
+        BadInput{"TwoOutputsOneFile", PlanThen({"--json", "@r.out", "--cases-out", "@r.out"}),
+                 "r.out: this file is written by --cases-out already", 2},
+        BadInput{"UnwritableOutput", PlanThen({"--json", "@no/such/folder/r.json"}),
+                 "r.json: cannot create the file", 2}),
+    [](const ::testing::TestParamInfo<BadInput>& p) { return p.param.fName; });
+
+// The plan checks: one line naming the file, the line, the field and the value.
+INSTANTIATE_TEST_SUITE_P(
+    PlanChecks, McsimSimulateBadInput,
+    ::testing::Values(
+        BadInput{"PlanIsADevice", PlanArgs({"/dev/zero"}),
+                 "/dev/zero: the plan file is not a regular file"},
         BadInput{"UnknownDistribution",
                  [](const hosttest::TempDir& d) {
                      return PlanWith(d, {{"<DistNormal numberOfParamSets=\"1\"><Parameters "
@@ -573,7 +634,7 @@ INSTANTIATE_TEST_SUITE_P(
                  "the contingency table has the category \"east\", which 'region' does not have"},
         BadInput{"TableAllZero",
                  [](const hosttest::TempDir& d) { return PlanWithTable(d, "0", "south"); },
-                 "the contingency table has every probability is 0"},
+                 "the contingency table has no usable probabilities: every probability is 0"},
         BadInput{"OtherMajorVersion",
                  [](const hosttest::TempDir& d) {
                      return PlanWith(d, {{"version=\"21.0.0.0\"", "version=\"99.0\""}});
@@ -585,55 +646,7 @@ INSTANTIATE_TEST_SUITE_P(
                      return PlanWith(d, {{"xmlns=\"http://xml.mcsim.org/software/analytics/",
                                           "xmlns=\"urn:other/"}});
                  },
-                 "the plan is of the namespace 'urn:other/"},
-        BadInput{"MissingModel",
-                 [](const hosttest::TempDir& d) {
-                     return std::vector<std::string>{d.Write("plan.xml", DemandPlan()), "--model",
-                                                     d.File("none.model")};
-                 },
-                 "none.model: cannot open the model file"},
-        BadInput{"ModelSyntaxError",
-                 [](const hosttest::TempDir& d) {
-                     return PlanAndModel(d, "unit_margin = price * (units\n");
-                 },
-                 "bad.model:1: syntax error"},
-        BadInput{"ModelUnknownField",
-                 [](const hosttest::TempDir& d) {
-                     return PlanAndModel(d, "unit_margin = price\nrevenue = price * volume\n");
-                 },
-                 "bad.model:2: unknown name 'volume'"},
-        BadInput{"TextInputWithoutLevels",
-                 [](const hosttest::TempDir& d) {
-                     return PlanAndModel(d, "unit_margin = price\nnorth = region == 0\n");
-                 },
-                 "bad.model:2: the model uses 'region', which holds text"},
-        BadInput{"PlanTargetNotInModel",
-                 [](const hosttest::TempDir& d) {
-                     return PlanAndModel(d, "unit_margin = price - unit_cost\n");
-                 },
-                 "the plan names the target 'revenue'"},
-        // Usage errors: found before the plan is simulated.
-        BadInput{"UnknownOption", PlanThen({"--bogus"}), "--bogus; see 'mcsim simulate --help'", 2},
-        BadInput{"CasesNotWhole", PlanThen({"--cases", "2.5"}),
-                 "--cases: 2.5 is not a whole number; expected a whole number from 1 to", 2},
-        BadInput{"PercentileZero", PlanThen({"--percentiles", "5,0"}),
-                 "--percentiles 0: a percentile lies strictly between 0 and 100", 2},
-        BadInput{"TornadoDeltaNan", PlanThen({"--tornado-delta", "nan"}),
-                 "expected a number above 0 and at most 100, not 'nan'", 2},
-        BadInput{"JsonOverThePlan", PlanThen({"--json", "@plan.xml"}),
-                 "plan.xml: this is the plan file; choose another output file", 2},
-        BadInput{"CasesOutIsALinkToTheModel",
-                 [](const hosttest::TempDir& d) {
-                     const std::string model = d.Write("m.model", hosttest::ReadFile(kModel));
-                     std::filesystem::create_symlink(model, d.File("link.csv"));
-                     return std::vector<std::string>{d.Write("plan.xml", DemandPlan()), "--model",
-                                                     model, "--cases-out", d.File("link.csv")};
-                 },
-                 "link.csv: this is the model file", 2},
-        BadInput{"TwoOutputsOneFile", PlanThen({"--json", "@r.out", "--cases-out", "@r.out"}),
-                 "r.out: this file is written by --cases-out already", 2},
-        BadInput{"UnwritableOutput", PlanThen({"--json", "@no/such/folder/r.json"}),
-                 "r.json: cannot create the file", 2}),
+                 "the plan is of the namespace 'urn:other/"}),
     [](const ::testing::TestParamInfo<BadInput>& p) { return p.param.fName; });
 
 } // namespace
