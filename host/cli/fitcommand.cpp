@@ -55,6 +55,12 @@ constexpr std::uint32_t kDefaultBootstrapSeed = 20240917;
 constexpr double kBootstrapLevel = 0.95;
 //! Rows of the contingency table printed before the rest is summarised.
 constexpr std::size_t kMaxTableRows = 24;
+//! Above this many fitted fields the report is compact (a line per field, the strongest
+//! correlations) unless --details asks for every candidate: thousands of fields would print
+//! tens of megabytes that nobody reads, and --json keeps everything.
+constexpr std::size_t kCompactFields = 20;
+//! Pairs listed by the compact report's correlation summary.
+constexpr std::size_t kCompactPairs = 10;
 //! Values of a parameter list printed in full; longer lists show their ends.
 constexpr std::size_t kMaxListValues = 8;
 
@@ -523,6 +529,65 @@ void PrintCovariate(std::ostream& out, const DFCOutputStats::DFCVarDistInfo& inf
     }
 }
 
+//! The compact report's line of a field: name, level, best fit and its test.
+void PrintFieldLine(std::ostream& out, const DFCOutputStats::DFCVarDistInfo& info,
+                    GoodFitType type) {
+    out << "  " << info.fFittedVarName << "  " << MeasureLevelName(info.fMeasureLevel) << "  ";
+    if (info.fDistBestType == kDistUnknown) {
+        out << "no fit\n";
+        return;
+    }
+    out << info.fDistBestName;
+    if (info.fMeasureLevel == kLevelCategorical) {
+        out << " (" << info.fCategoryCounts.size() << " categories)\n";
+        return;
+    }
+    const std::string params = Params(
+        ReportParamNames(info.fDistBestType, info.fDistBestParamNames), info.fDistBestParams);
+    if (!params.empty()) {
+        out << "  " << params;
+    }
+    if (!MCMV::IsMissing(info.fBestFitStat)) {
+        out << "  " << StatisticName(info.fMeasureLevel, type) << " " << Num(info.fBestFitStat);
+    }
+    if (!MCMV::IsMissing(info.fBestFitPValue)) {
+        out << ", p-value " << BestPValueText(info, type);
+    }
+    out << "\n";
+}
+
+//! The compact report's correlations: how many pairs, and the strongest in size.
+void PrintCorrelationSummary(std::ostream& out, const DFCOutputStats& stats) {
+    const auto& covariates = stats.GetCovarDistInfo();
+    const auto& corr = stats.GetCorrMatrix();
+    const int n = std::min(static_cast<int>(covariates.size()), corr.GetNRows());
+    if (n < 2) {
+        return;
+    }
+    std::vector<std::pair<double, std::pair<int, int>>> pairs;
+    for (int i = 1; i < n; ++i) {
+        for (int j = 0; j < i; ++j) {
+            const double r = corr.GetElem(i, j);
+            if (!MCMV::IsMissing(r)) {
+                pairs.push_back({std::fabs(r), {i, j}});
+            }
+        }
+    }
+    const std::size_t shown = std::min(kCompactPairs, pairs.size());
+    std::partial_sort(pairs.begin(), pairs.begin() + static_cast<std::ptrdiff_t>(shown),
+                      pairs.end(), [](const auto& a, const auto& b) { return a.first > b.first; });
+    out << "\ncorrelations: " << pairs.size() << " pairs (all in the plan), the " << shown
+        << " largest in size\n";
+    for (std::size_t k = 0; k < shown; ++k) {
+        const auto [i, j] = pairs[k].second;
+        std::ostringstream cell;
+        cell << std::fixed << std::setprecision(3) << corr.GetElem(i, j);
+        out << "  " << covariates[static_cast<std::size_t>(i)].fFittedVarName << " ~ "
+            << covariates[static_cast<std::size_t>(j)].fFittedVarName << "  " << cell.str()
+            << "\n";
+    }
+}
+
 void PrintFactor(std::ostream& out, const DFCOutputStats::DFCVarDistInfo& info) {
     out << "\n"
         << info.fFittedVarName << "  (categorical, " << info.fCategoryCounts.size()
@@ -916,6 +981,9 @@ CLI::App* AddFitCommand(CLI::App& app, FitOptions& options) {
                     "(Kolmogorov-Smirnov) or both (best fit by Anderson-Darling)")
         ->check(CLI::IsMember({"ad", "ks", "both"}))
         ->capture_default_str();
+    fit->add_flag("--details", options.fbDetails,
+                  "Every field's candidates and the whole correlation matrix, however many "
+                  "fields are fitted (above 20 the report is a line per field)");
     fit->add_flag("--crosstabs", options.fbCrosstabs,
                   "Fit the joint contingency table of the categorical fields");
     fit->add_option("--cases", options.fCases, "Use only the first N rows (0: all)")
@@ -1139,16 +1207,35 @@ int RunFit(const FitOptions& options, std::ostream& out, std::ostream& err) {
 
         const auto& covInfo = settings.GetCovariateInfoElems();
         const auto& covariates = chosen.GetCovarDistInfo();
-        for (std::size_t i = 0; i < covariates.size(); ++i) {
+        const bool compact =
+            !options.fbDetails &&
+            covariates.size() + chosen.GetFactorDistInfo().size() > kCompactFields;
+        if (compact) {
+            out << "\n" << covariates.size() + chosen.GetFactorDistInfo().size()
+                << " fields, a line each (--details for every candidate, --json for all the "
+                   "results)\n";
+            for (const auto& info : covariates) {
+                PrintFieldLine(out, info, settings.GetGFType());
+            }
+            for (const auto& info : chosen.GetFactorDistInfo()) {
+                PrintFieldLine(out, info, settings.GetGFType());
+            }
+            PrintCorrelationSummary(out, chosen);
+        }
+        for (std::size_t i = 0; i < covariates.size() && !compact; ++i) {
             const int index = settings.GetCovariates()[i];
             PrintCovariate(out, covariates[i], covInfo[i],
                            dict.GetFields()[static_cast<std::size_t>(index)], settings.GetGFType(),
                            run.fvDecisions[i], rank);
         }
         for (const auto& info : chosen.GetFactorDistInfo()) {
-            PrintFactor(out, info);
+            if (!compact) {
+                PrintFactor(out, info);
+            }
         }
-        PrintCorrelations(out, chosen);
+        if (!compact) {
+            PrintCorrelations(out, chosen);
+        }
         PrintCrosstabs(out, chosen);
         PrintBootstrap(out, run.fvBootstraps, chosen, options.fBootstrap, seed);
         PrintWarnings(out, algorithm.GetWarnings());

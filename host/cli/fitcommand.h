@@ -29,6 +29,7 @@ struct FitOptions {
     std::vector<std::string> fvLevels;  //!< NAME=LEVEL overrides
     std::string fTest = "ad";           //!< ad, ks or both
     bool fbCrosstabs = false;           //!< joint table of the categorical fields
+    bool fbDetails = false;             //!< every field's candidates even for wide data
     int fCases = 0;                     //!< rows to use, 0 all
     int fBins = 100;                    //!< histogram bins
     int fThreads = 0;                   //!< worker threads, 0 one per processor

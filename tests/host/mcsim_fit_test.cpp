@@ -147,6 +147,31 @@ TEST(McsimFit, FindsTheSeparatorAndReadsDecimalCommas) {
     EXPECT_EQ(numbers.err, "");
 }
 
+TEST(McsimFit, WideDataGetsALinePerFieldUnlessDetailsAreAsked) {
+    hosttest::TempDir dir;
+    std::string text;
+    for (int c = 0; c < 25; ++c) {
+        text += (c ? ",x" : "x") + std::to_string(c);
+    }
+    text += "\n";
+    for (int r = 0; r < 60; ++r) {
+        for (int c = 0; c < 25; ++c) {
+            text += (c ? "," : "") + std::to_string((r * (c + 3)) % 17 + 0.013 * r + 0.5 * c);
+        }
+        text += "\n";
+    }
+    const std::string path = dir.Write("wide.csv", text);
+    const CommandRun compact = Mcsim({"fit", path}, dir);
+    ASSERT_EQ(compact.status, 0) << compact.err;
+    EXPECT_NE(compact.out.find("25 fields, a line each"), std::string::npos) << compact.out;
+    EXPECT_NE(compact.out.find("correlations: 300 pairs"), std::string::npos) << compact.out;
+    EXPECT_EQ(compact.out.find("ranked candidates"), std::string::npos);
+    EXPECT_LT(std::count(compact.out.begin(), compact.out.end(), '\n'), 50);
+    const CommandRun details = Mcsim({"fit", path, "--details"}, dir);
+    ASSERT_EQ(details.status, 0) << details.err;
+    EXPECT_NE(details.out.find("ranked candidates"), std::string::npos);
+}
+
 TEST(McsimFit, HelpForTheCommandAndTheSubcommand) {
     hosttest::TempDir dir;
     const CommandRun top = Mcsim({"--help"}, dir);
