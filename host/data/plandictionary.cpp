@@ -249,8 +249,11 @@ PlanDictionary PlanDictionary::Build(const SPCSettings& plan, const std::string&
 
     const std::string problem = model.CheckInputs(inputNames);
     if (!problem.empty()) {
-        throw HostError(problem + "; the inputs of " + planPath +
-                        " are its simulated and fixed fields");
+        // An unknown name is most often a field the plan does not have: say which it has.
+        const bool unknown = problem.find("unknown name") != std::string::npos;
+        throw HostError(unknown ? problem + "; the inputs of " + planPath +
+                                      " are its simulated and fixed fields"
+                                : problem);
     }
     CheckTextInputs(model, dict.fvInputs, plan, planPath);
     CheckTargets(model, plan, planPath);

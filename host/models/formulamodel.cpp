@@ -394,6 +394,13 @@ std::string FormulaModel::CheckInputs(const std::vector<std::string>& inputs) co
             if (known.count(n) != 0 || earlier.count(n) != 0) {
                 continue;
             }
+            // A name cannot start with a digit or a point: this is a number the expression
+            // reader could not take (1e999 overflows a double).
+            if (!n.empty() && (std::isdigit(static_cast<unsigned char>(n[0])) || n[0] == '.')) {
+                return LocatedMessage(fFileName, t.fLine,
+                                      "the number '" + n + "' in the expression of '" + t.fName +
+                                          "' is not a finite double");
+            }
             const bool later = std::any_of(fvTargets.begin(), fvTargets.end(),
                                            [&](const FormulaTarget& o) { return o.fName == n; });
             return LocatedMessage(fFileName, t.fLine,

@@ -540,6 +540,12 @@ INSTANTIATE_TEST_SUITE_P(
                      return PlanAndModel(d, "unit_margin = price * (units\n");
                  },
                  "bad.model:1: syntax error"},
+        BadInput{"ModelNumberOverflows",
+                 [](const hosttest::TempDir& d) {
+                     return PlanAndModel(d, "unit_margin = 1e999 * price\n");
+                 },
+                 "bad.model:1: the number '1e999' in the expression of 'unit_margin' is not a "
+                 "finite double"},
         BadInput{"ModelUnknownField",
                  [](const hosttest::TempDir& d) {
                      return PlanAndModel(d, "unit_margin = price\nrevenue = price * volume\n");
