@@ -456,6 +456,22 @@ std::string BestPValueText(const DFCOutputStats::DFCVarDistInfo& info, GoodFitTy
                : PValueText(info.fBestFitPValue, e.fADPValueLower, e.fADPValueUpper);
 }
 
+//! The best fit's parameters, test statistic and p-value, each after two spaces when present.
+void WriteBestFitFigures(std::ostream& out, const DFCOutputStats::DFCVarDistInfo& info,
+                         GoodFitType type) {
+    const std::string params = Params(
+        ReportParamNames(info.fDistBestType, info.fDistBestParamNames), info.fDistBestParams);
+    if (!params.empty()) {
+        out << "  " << params;
+    }
+    if (!MCMV::IsMissing(info.fBestFitStat)) {
+        out << "  " << StatisticName(info.fMeasureLevel, type) << " " << Num(info.fBestFitStat);
+    }
+    if (!MCMV::IsMissing(info.fBestFitPValue)) {
+        out << ", p-value " << BestPValueText(info, type);
+    }
+}
+
 void PrintCovariate(std::ostream& out, const DFCOutputStats::DFCVarDistInfo& info,
                     const DFCSettings::VarInfoElem& allowed, const DataField& field,
                     GoodFitType type, const FitDecision& decision, FitRule order) {
@@ -466,17 +482,7 @@ void PrintCovariate(std::ostream& out, const DFCOutputStats::DFCVarDistInfo& inf
     out << ")\n";
     if (info.fDistBestType != kDistUnknown) {
         out << "  best fit   " << info.fDistBestName;
-        const std::string params = Params(
-            ReportParamNames(info.fDistBestType, info.fDistBestParamNames), info.fDistBestParams);
-        if (!params.empty()) {
-            out << "  " << params;
-        }
-        if (!MCMV::IsMissing(info.fBestFitStat)) {
-            out << "  " << StatisticName(info.fMeasureLevel, type) << " " << Num(info.fBestFitStat);
-        }
-        if (!MCMV::IsMissing(info.fBestFitPValue)) {
-            out << ", p-value " << BestPValueText(info, type);
-        }
+        WriteBestFitFigures(out, info, type);
         out << "\n";
         out << "  chosen by  " << decision.fRule << ": " << decision.fWhy << "\n";
         const auto k = static_cast<std::size_t>(info.fDistBestType);
@@ -542,17 +548,7 @@ void PrintFieldLine(std::ostream& out, const DFCOutputStats::DFCVarDistInfo& inf
         out << " (" << info.fCategoryCounts.size() << " categories)\n";
         return;
     }
-    const std::string params = Params(
-        ReportParamNames(info.fDistBestType, info.fDistBestParamNames), info.fDistBestParams);
-    if (!params.empty()) {
-        out << "  " << params;
-    }
-    if (!MCMV::IsMissing(info.fBestFitStat)) {
-        out << "  " << StatisticName(info.fMeasureLevel, type) << " " << Num(info.fBestFitStat);
-    }
-    if (!MCMV::IsMissing(info.fBestFitPValue)) {
-        out << ", p-value " << BestPValueText(info, type);
-    }
+    WriteBestFitFigures(out, info, type);
     out << "\n";
 }
 
